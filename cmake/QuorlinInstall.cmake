@@ -1,0 +1,44 @@
+# SPDX-License-Identifier: Apache-2.0
+# Copyright the Quorlin authors
+#
+# The installed package: find_package(Quorlin) gives Quorlin::quorlin and Pelmar::pelmar, pkg-config gives quorlin and
+# pelmar. Two CMake packages, because the platform stands on its own.
+
+include(CMakePackageConfigHelpers)
+
+# The .pc files find their prefix from where they lie, so that an installed tree may be moved.
+file(RELATIVE_PATH pc_to_prefix "/prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/prefix")
+string(REGEX REPLACE "/$" "" pc_to_prefix "${pc_to_prefix}")
+if(QUORLIN_LIBRARY_TYPE STREQUAL "STATIC")
+  set(pc_pelmar_requires "expat openssl >= 3.0 libcurl >= 7.85")
+endif()
+
+function(quorlin_install_library target name package)
+  set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/${package}")
+  set(generated_dir "${PROJECT_BINARY_DIR}/package")
+
+  install(TARGETS ${target} EXPORT ${package}Targets
+    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+    ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+    FILE_SET HEADERS DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
+  install(EXPORT ${package}Targets NAMESPACE ${package}:: DESTINATION "${package_dir}")
+
+  configure_package_config_file("${PROJECT_SOURCE_DIR}/cmake/${package}Config.cmake.in"
+    "${generated_dir}/${package}Config.cmake" INSTALL_DESTINATION "${package_dir}")
+  # Before 1.0 a minor version may change the interface.
+  write_basic_package_version_file("${generated_dir}/${package}ConfigVersion.cmake"
+    VERSION ${PROJECT_VERSION} COMPATIBILITY SameMinorVersion)
+  configure_file("${PROJECT_SOURCE_DIR}/cmake/${name}.pc.in" "${generated_dir}/${name}.pc" @ONLY)
+
+  install(FILES "${generated_dir}/${package}Config.cmake" "${generated_dir}/${package}ConfigVersion.cmake"
+    DESTINATION "${package_dir}")
+  install(FILES "${generated_dir}/${name}.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+endfunction()
+
+quorlin_install_library(pelmar_library pelmar Pelmar)
+quorlin_install_library(quorlin_library quorlin Quorlin)
+
+if(TARGET quorlin)
+  install(TARGETS quorlin RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}")
+endif()
+install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")

@@ -1,0 +1,63 @@
+# SPDX-License-Identifier: Apache-2.0
+# Copyright the Quorlin authors
+#
+# How every target of ours is compiled and linked.
+
+include(CheckPIESupported)
+check_pie_supported(LANGUAGES CXX)
+
+# Warnings are our business alone: linked PRIVATE for the build, never exported.
+add_library(quorlin_warnings INTERFACE)
+target_compile_options(quorlin_warnings INTERFACE
+  -Wall -Wextra -Wpedantic -Wconversion -Wshadow -Wnon-virtual-dtor
+  $<$<BOOL:${QUORLIN_WERROR}>:-Werror>)
+
+add_library(quorlin_hardening INTERFACE)
+# Checked conditions are part of the product: -UNDEBUG stands after whatever the build type or an outer project defines.
+# The macro prefix keeps the builder's paths out of the messages that name a source file.
+target_compile_options(quorlin_hardening INTERFACE
+  -UNDEBUG
+  -fstack-protector-strong
+  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
+target_compile_definitions(quorlin_hardening INTERFACE _GLIBCXX_ASSERTIONS)
+# _FORTIFY_SOURCE needs an optimised build, and hides accesses from the sanitizers.
+if(NOT QUORLIN_SANITIZE)
+  target_compile_options(quorlin_hardening INTERFACE
+    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-U_FORTIFY_SOURCE>
+    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-D_FORTIFY_SOURCE=2>)
+endif()
+target_link_options(quorlin_hardening INTERFACE -Wl,-z,relro,-z,now)
+
+# quorlin_target_defaults(<target>): language level, visibility, warnings and hardening of one target of ours.
+function(quorlin_target_defaults target)
+  target_compile_features(${target} PRIVATE cxx_std_17)
+  set_target_properties(${target} PROPERTIES
+    CXX_EXTENSIONS OFF
+    CXX_VISIBILITY_PRESET hidden
+    VISIBILITY_INLINES_HIDDEN ON
+    POSITION_INDEPENDENT_CODE ON
+    BUILD_RPATH_USE_ORIGIN ON)
+  target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:quorlin_warnings> $<BUILD_INTERFACE:quorlin_hardening>)
+endfunction()
+
+# quorlin_library_face(<target> <name>): the shared (or, on request, static) library <name> as others see it, with the
+# headers of lib/public/<name> as its interface. Consumers need no more than C++11.
+function(quorlin_library_face target name)
+  file(GLOB_RECURSE headers CONFIGURE_DEPENDS "${PROJECT_SOURCE_DIR}/lib/public/${name}/*.h")
+  target_sources(${target} PUBLIC FILE_SET HEADERS BASE_DIRS "${PROJECT_SOURCE_DIR}/lib/public" FILES ${headers})
+  target_compile_features(${target} INTERFACE cxx_std_11)
+  target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:quorlin_hardening>)
+  set_target_properties(${target} PROPERTIES
+    OUTPUT_NAME ${name}
+    EXPORT_NAME ${name}
+    LINKER_LANGUAGE CXX
+    VERSION ${PROJECT_VERSION}
+    SOVERSION ${PROJECT_VERSION_MAJOR}
+    BUILD_RPATH_USE_ORIGIN ON
+    INSTALL_RPATH "$ORIGIN")
+  # A symbol nobody provides shall stop our link, not the first program that loads us. The sanitizers' own symbols
+  # come from the program, so there the check cannot be made.
+  if(QUORLIN_LIBRARY_TYPE STREQUAL "SHARED" AND NOT QUORLIN_SANITIZE AND NOT QUORLIN_LIBFUZZER)
+    target_link_options(${target} PRIVATE -Wl,--no-undefined)
+  endif()
+endfunction()
