@@ -35,8 +35,7 @@ function(quorlin_target_defaults target)
     CXX_EXTENSIONS OFF
     CXX_VISIBILITY_PRESET hidden
     VISIBILITY_INLINES_HIDDEN ON
-    POSITION_INDEPENDENT_CODE ON
-    BUILD_RPATH_USE_ORIGIN ON)
+    POSITION_INDEPENDENT_CODE ON)
   target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:quorlin_warnings> $<BUILD_INTERFACE:quorlin_hardening>)
 endfunction()
 
@@ -52,12 +51,19 @@ function(quorlin_library_face target name)
     EXPORT_NAME ${name}
     LINKER_LANGUAGE CXX
     VERSION ${PROJECT_VERSION}
-    SOVERSION ${PROJECT_VERSION_MAJOR}
-    BUILD_RPATH_USE_ORIGIN ON
-    INSTALL_RPATH "$ORIGIN")
+    SOVERSION ${PROJECT_VERSION_MAJOR})
   # A symbol nobody provides shall stop our link, not the first program that loads us. The sanitizers' own symbols
   # come from the program, so there the check cannot be made.
   if(QUORLIN_LIBRARY_TYPE STREQUAL "SHARED" AND NOT QUORLIN_SANITIZE AND NOT QUORLIN_LIBFUZZER)
     target_link_options(${target} PRIVATE -Wl,--no-undefined)
   endif()
+endfunction()
+
+# quorlin_run_path(<target> <path>...): where <target> looks for our libraries. Our own build tree lies like an installed one, so
+# the path is final from the start: the one CMake would rewrite on installing is padded with empty entries, and to the
+# loader an empty entry is the current folder.
+function(quorlin_run_path target)
+  set(path ${ARGN})
+  list(REMOVE_DUPLICATES path)
+  set_target_properties(${target} PROPERTIES INSTALL_RPATH "${path}" BUILD_WITH_INSTALL_RPATH ${PROJECT_IS_TOP_LEVEL})
 endfunction()
