@@ -27,9 +27,9 @@ enum NodeKind { DOCUMENT_NODE, ELEMENT_NODE, TEXT_NODE, COMMENT_NODE, PROCESSING
 
 /// A node of a document tree.
 ///
-/// Ownership: a parent owns its children; whoever holds a `Ref` to a node keeps that node and all below it alive, but not what is
-/// above: when the parent dies, the node has no parent any more.
-/// Threads: a tree that nobody changes may be read from several threads; a changing one belongs to one thread.
+/// Ownership: a parent owns its children; whoever holds a `Ref` to a node keeps that node and all below it
+/// alive, but not what is above: when the parent dies, the node has no parent any more. Threads: a tree that
+/// nobody changes may be read from several threads; a changing one belongs to one thread.
 class PELMAR_API Node : public Object {
  public:
   NodeKind GetKind() const noexcept { return _kind; }
@@ -60,13 +60,13 @@ class PELMAR_API ParentNode : public Node {
   Node* GetLastChildNode() const noexcept { return _lastChild; }
   std::size_t GetChildCount() const noexcept { return _childCount; }
 
-  /// Makes `child` the last child, taking it away from its present parent if it has one. Throws InvalidArgumentException for null,
-  /// for a document, for a node that is this node or one of its ancestors, and, when this node is a document, for a text and for a
-  /// second element (XML 1.0, production 1).
+  /// Makes `child` the last child, taking it away from its present parent if it has one. Throws
+  /// InvalidArgumentException for null, for a document, for a node that is this node or one of its ancestors,
+  /// and, when this node is a document, for a text and for a second element (XML 1.0, production 1).
   void AppendChild(const Ref<Node>& child);
 
-  /// Takes `child` out of the children; whoever holds a `Ref` to it may use it elsewhere. Throws InvalidArgumentException when it
-  /// is not a child of this node.
+  /// Takes `child` out of the children; whoever holds a `Ref` to it may use it elsewhere. Throws
+  /// InvalidArgumentException when it is not a child of this node.
   void RemoveChild(Node* child);
 
  protected:
@@ -81,7 +81,8 @@ class PELMAR_API ParentNode : public Node {
   std::size_t _childCount;
 };
 
-/// One attribute as written: its name with prefix, and its value. Namespace declarations are attributes like any other.
+/// One attribute as written: its name with prefix, and its value. Namespace declarations are attributes like
+/// any other.
 struct Attribute {
   std::string name;
   std::string value;
@@ -97,8 +98,8 @@ class PELMAR_API ElementNode final : public ParentNode {
   /// "prefix:local", or the local name alone.
   std::string GetQualifiedName() const;
 
-  /// Line and column, counted from 1, of the element's "<" in the parsed text, the column in characters. Both 0 for an element
-  /// that was not parsed.
+  /// Line and column, counted from 1, of the element's "<" in the parsed text, the column in characters. Both
+  /// 0 for an element that was not parsed.
   unsigned long GetLine() const noexcept { return _line; }
   unsigned long GetColumn() const noexcept { return _column; }
 
@@ -107,18 +108,22 @@ class PELMAR_API ElementNode final : public ParentNode {
   /// The names as written, declarations included, sorted bytewise.
   std::set<std::string> GetAttributeNames() const;
 
-  /// Looks an attribute up by its name as written. True and the value when there is one; else false and `value` unchanged.
+  /// Looks an attribute up by its name as written. True and the value when there is one; else false and
+  /// `value` unchanged.
   bool GetAttribute(const std::string& name, std::string& value) const;
-  /// Looks an attribute up by its expanded name; an unprefixed attribute is in no namespace (Namespaces in XML 1.0, section 6.2).
+  /// Looks an attribute up by its expanded name; an unprefixed attribute is in no namespace (Namespaces in
+  /// XML 1.0, section 6.2).
   bool GetAttribute(const QName& name, std::string& value) const;
 
-  /// The URI that `prefix` is bound to here (empty prefix: the default namespace), looked for on this element and outward; null when
-  /// it is not declared, or taken back by xmlns="". The prefix "xml" is always bound. The pointer is valid as long as the declaring element stays unchanged.
+  /// The URI that `prefix` is bound to here (empty prefix: the default namespace), looked for on this element
+  /// and outward; null when it is not declared, or taken back by xmlns="". The prefix "xml" is always bound.
+  /// The pointer is valid as long as the declaring element stays unchanged.
   const std::string* FindNamespaceUri(const std::string& prefix) const noexcept;
 
-  /// Adds an attribute after those that stand. One with the same name and value is left as it is; one with the same name and another
-  /// value, a malformed name, text that XML 1.0 cannot carry, and a declaration that Namespaces in XML 1.0 forbids are refused with
-  /// InvalidArgumentException, which does not repeat the value.
+  /// Adds an attribute after those that stand. One with the same name and value is left as it is; one with
+  /// the same name and another value, a malformed name, text that XML 1.0 cannot carry, and a declaration
+  /// that Namespaces in XML 1.0 forbids are refused with InvalidArgumentException, which does not repeat the
+  /// value.
   void DefineAttribute(const std::string& name, const std::string& value);
 
   /// The first child element with this local name, whatever its namespace; null when there is none.
@@ -126,9 +131,10 @@ class PELMAR_API ElementNode final : public ParentNode {
   /// The first child element with this namespace and local name; null when there is none.
   ElementNode* FindChildElement(const std::string& namespaceUri, const std::string& localName) const noexcept;
 
-  /// Writes the element as XML text (XML 1.0), without XML declaration and without added white space. Attributes come in their order;
-  /// an element that was built without content is written "<a/>", a parsed one as it was written. Parsing the text gives the same tree.
-  /// No namespace declarations are added: a prefix that is declared further out is the caller's affair.
+  /// Writes the element as XML text (XML 1.0), without XML declaration and without added white space.
+  /// Attributes come in their order; an element that was built without content is written "<a/>", a parsed
+  /// one as it was written. Parsing the text gives the same tree. No namespace declarations are added: a
+  /// prefix that is declared further out is the caller's affair.
   void WriteXml(Writer* writer) const;
 
  private:
@@ -148,11 +154,13 @@ class PELMAR_API ElementNode final : public ParentNode {
   bool _writtenWithEndTag;
 };
 
-/// Character data. Adjacent runs of characters, references and CDATA sections are one text node after parsing.
+/// Character data. Adjacent runs of characters, references and CDATA sections are one text node after
+/// parsing.
 class PELMAR_API TextNode final : public Node {
  public:
   const std::string& GetText() const noexcept { return _text; }
-  /// Throws InvalidArgumentException for text that XML 1.0 cannot carry or that is not UTF-8; the message does not repeat it.
+  /// Throws InvalidArgumentException for text that XML 1.0 cannot carry or that is not UTF-8; the message
+  /// does not repeat it.
   void SetText(const std::string& text);
 
  private:
@@ -202,9 +210,10 @@ class PELMAR_API Document final : public ParentNode {
   ~Document() override;
 };
 
-/// A new element named prefix:localName (localName alone for an empty prefix) without parent, attributes and children.
-/// Throws InvalidArgumentException for a malformed name.
-PELMAR_API void CreateElementNode(const std::string& prefix, const std::string& localName, Ref<ElementNode>& result);
+/// A new element named prefix:localName (localName alone for an empty prefix) without parent, attributes and
+/// children. Throws InvalidArgumentException for a malformed name.
+PELMAR_API void CreateElementNode(const std::string& prefix, const std::string& localName,
+                                  Ref<ElementNode>& result);
 
 /// A new, empty text node.
 PELMAR_API void CreateTextNode(Ref<TextNode>& result);

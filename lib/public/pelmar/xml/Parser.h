@@ -18,7 +18,8 @@
 namespace Pelmar {
 namespace Xml {
 
-/// The text is not XML as this parser accepts it. The message ends in " at line L, column C" (both counted from 1).
+/// The text is not XML as this parser accepts it. The message ends in " at line L, column C" (both counted
+/// from 1).
 class PELMAR_API XMLParseException : public Exception {
  public:
   XMLParseException(const std::string& reason, unsigned long line, unsigned long column);
@@ -35,23 +36,27 @@ class PELMAR_API XMLParseException : public Exception {
   unsigned long _column;
 };
 
-/// What the parser refuses beyond malformed text. Real messages stay far below; hostile ones are refused before they cost anything.
+/// What the parser refuses beyond malformed text. Real messages stay far below; hostile ones are refused
+/// before they cost anything.
 enum ParserLimit : std::size_t {
   kMaxDocumentBytes = 16 * 1024 * 1024,
-  /// Elements, attributes, comments and processing instructions together: a tree of nothing but "<a/>" would take fifty times the
-  /// memory of its text.
+  /// Elements, attributes, comments and processing instructions together: a tree of nothing but "<a/>" would
+  /// take fifty times the memory of its text.
   kMaxNodes = 1024 * 1024,
   kMaxElementDepth = 256,
   kMaxAttributesPerElement = 256,
   kMaxNamespaceDeclarationsInScope = 256
 };
 
-/// Takes the parser's events in document order. Names and values are UTF-8, normalised as XML 1.0 demands, and valid during the call.
-/// An exception thrown by a handler ends the parse and reaches the caller of `Parse`.
+/// Takes the parser's events in document order. Names and values are UTF-8, normalised as XML 1.0 demands,
+/// and valid during the call. An exception thrown by a handler ends the parse and reaches the caller of
+/// `Parse`.
 class PELMAR_API XMLHandler : public Object {
  public:
-  /// `attributes` holds name, value, name, value, ..., null. `line` and `column` are those of the "<", counted from 1.
-  virtual void StartElement(const char* name, const char* const* attributes, unsigned long line, unsigned long column) = 0;
+  /// `attributes` holds name, value, name, value, ..., null. `line` and `column` are those of the "<",
+  /// counted from 1.
+  virtual void StartElement(const char* name, const char* const* attributes, unsigned long line,
+                            unsigned long column) = 0;
   /// `emptyTag` tells that the element was written "<a/>".
   virtual void EndElement(bool emptyTag) = 0;
   virtual void Characters(const char* text, std::size_t size) = 0;
@@ -64,12 +69,14 @@ class PELMAR_API XMLHandler : public Object {
   ~XMLHandler() override;
 };
 
-/// Reads one document: XML 1.0 in UTF-8 (a byte order mark may lead it), well-formed also in its namespaces, within the limits above.
-/// Every DOCTYPE is refused, so there are no entities but the five of XML itself, and nothing is ever fetched.
-/// A prefix that is nowhere declared is left for the reader of the tree to refuse, who can name the element.
+/// Reads one document: XML 1.0 in UTF-8 (a byte order mark may lead it), well-formed also in its namespaces,
+/// within the limits above. Every DOCTYPE is refused, so there are no entities but the five of XML itself,
+/// and nothing is ever fetched. A prefix that is nowhere declared is left for the reader of the tree to
+/// refuse, who can name the element.
 class PELMAR_API XMLParser : public Object {
  public:
-  /// Parses everything `reader` yields and stores the handler's result. Throws XMLParseException; `result` is then unchanged.
+  /// Parses everything `reader` yields and stores the handler's result. Throws XMLParseException; `result` is
+  /// then unchanged.
   virtual void Parse(Reader* reader, Ref<Object>& result) = 0;
 
  protected:

@@ -1,0 +1,46 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// The platform's private key, and what the TLS layer may ask of it.
+
+#ifndef PELMAR_CRYPTO_PRIVATEKEYIMPL_H
+#define PELMAR_CRYPTO_PRIVATEKEYIMPL_H
+
+#include <pelmar/crypto/PrivateKey.h>
+
+#include <cstddef>
+#include <memory>
+#include <vector>
+
+struct evp_pkey_st;
+
+namespace Pelmar {
+namespace Crypto {
+
+class PrivateKeyImpl final : public PrivateKey {
+ public:
+  /// Takes `key` over. Throws CryptoException when it is not good enough (KeyStrength.h); it is freed then
+  /// too.
+  explicit PrivateKeyImpl(evp_pkey_st* key);
+
+  KeyType GetType() const override { return _type; }
+  std::vector<unsigned char> Sign(DigestAlgorithm digest, const void* data, std::size_t size) const override;
+
+  /// OpenSSL's object, owned by this one.
+  evp_pkey_st* GetKey() const noexcept { return _key.get(); }
+
+ private:
+  struct KeyDeleter {
+    void operator()(evp_pkey_st* key) const noexcept;
+  };
+
+  ~PrivateKeyImpl() override;
+
+  std::unique_ptr<evp_pkey_st, KeyDeleter> _key;
+  KeyType _type;
+};
+
+}  // namespace Crypto
+}  // namespace Pelmar
+
+#endif  // PELMAR_CRYPTO_PRIVATEKEYIMPL_H

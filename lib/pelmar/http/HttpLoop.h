@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// The one thread that does all HTTP of the process.
+
+#ifndef PELMAR_HTTP_HTTPLOOP_H
+#define PELMAR_HTTP_HTTPLOOP_H
+
+#include "pelmar/http/Exchange.h"
+#include "pelmar/http/LaneSet.h"
+#include "pelmar/http/Poller.h"
+
+#include <boost/function.hpp>
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <thread>
+#include <vector>
+
+namespace Pelmar {
+namespace Http {
+
+/// Starts with the first request. Every libcurl object lives on its thread; other threads leave commands in a queue. It runs no code
+/// of a caller: completion functors go to the thread pool. When the process exits, requests still pending end with an HttpException,
+/// and so do those sent later.
+class HttpLoop final {
+ public:
+  /// Hands work to the thread pool; throws when the pool cannot take it now.
+  using QueueFunction = std::function<void(const boost::function<void()>&)>;
+
+  explicit HttpLoop(QueueFunction queue);
+  HttpLoop(const HttpLoop&) = delete;
+  HttpLoop& operator=(const HttpLoop&) = delete;
+  /// Shuts down.
+  ~HttpLoop();
+
+  /// The process's loop. Never destroyed: objects that end with the process may still call it.
+  static HttpLoop& Get();
+
+  /// Starts the exchange. Throws HttpException when the loop cannot be started.
+  void Submit(const Ref<Exchange>& exchange);
+  /// Closes the connection of an exchange that was settled elsewhere.
+  void Abandon(const Ref<Exchange>& exchange);
+  /// The agent, or the spec and all its agents, are gone.
+  void DropAgent(std::uint64_t agent) noexcept;
+  void DropSpec(std::uint64_t spec) noexcept;
+
+  /// Queues work on the thread pool. If the pool cannot take it now, the loop tries again until it can. Work that comes after the
+  /// shutdown is destroyed.
+  void Deliver(Work work);
+
+  /// Ends the thread. A second call does nothing.
+  void Shutdown();
+
+ private:
+  enum class Verb { SUBMIT, ABANDON, DROP_AGENT, DROP_SPEC };
+
+  struct Command {
+    Verb verb;
+    Ref<Exchange> exchange;
+    std::uint64_t id;
+  };
+
+  bool Post(Command command);
+  void StartThread();
+  void Run();
+  bool TakeCommands(std::vector<Command>& commands);
+  static void Obey(const Command& command, LaneSet& lanes);
+  /// Whether something is left to deliver.
+  bool Redeliver();
+
+  const QueueFunction _queue;
+  std::mutex _mutex;
+  // All below are guarded by the mutex.
+  std::vector<Command> _commands;
+  Work _undelivered;
+  std::unique_ptr<Poller> _poller;  // Made once; the loop's thread waits on it without the mutex.
+  std::thread _thread;
+  bool _stopped = false;
+};
+
+}  // namespace Http
+}  // namespace Pelmar
+
+#endif  // PELMAR_HTTP_HTTPLOOP_H

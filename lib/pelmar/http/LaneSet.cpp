@@ -1,0 +1,138 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "pelmar/http/LaneSet.h"
+
+#include <algorithm>
+#include <exception>
+#include <iterator>
+#include <limits>
+#include <utility>
+
+namespace Pelmar {
+namespace Http {
+
+namespace {
+
+ShareHandle CreateShare() {
+  ShareHandle share(curl_share_init());
+  // One thread uses it, so it needs no lock functions.
+  if (!share || curl_share_setopt(share.get(), CURLSHOPT_SHARE, CURL_LOCK_DATA_SSL_SESSION) != CURLSHE_OK ||
+      curl_share_setopt(share.get(), CURLSHOPT_SHARE, CURL_LOCK_DATA_DNS) != CURLSHE_OK) {
+    throw HttpException("The HTTP engine cannot be set up");
+  }
+  return share;
+}
+
+/// Rounded up: to wake early is to wake twice.
+int CountMilliseconds(Lane::Clock::duration duration) {
+  const auto count = std::chrono::ceil<std::chrono::milliseconds>(duration).count();
+  return static_cast<int>(std::clamp<long long>(count, 0, std::numeric_limits<int>::max()));
+}
+
+}  // namespace
+
+LaneSet::LaneSet(Poller& poller) : _poller(poller) {}
+
+LaneSet::~LaneSet() = default;
+
+void LaneSet::Submit(const Ref<Exchange>& exchange) {
+  if (exchange->IsSettled()) {
+    return;
+  }
+  try {
+    const AgentParts& agent = exchange->GetAgent();
+    GetLane(agent.id).Start(exchange, GetShare(agent.spec->GetId()));
+  } catch (const HttpException& e) {
+    exchange->Settle(std::make_shared<const HttpException>(e), nullptr);
+  } catch (const std::exception&) {
+    exchange->Settle(std::make_shared<const HttpException>("Out of memory"), nullptr);
+  }
+}
+
+void LaneSet::Abandon(const Exchange& exchange) {
+  const auto entry = _lanes.find(exchange.GetAgent().id);
+  if (entry != _lanes.end()) {
+    entry->second.lane->Abandon(&exchange);
+  }
+}
+
+void LaneSet::DropAgent(std::uint64_t agent) {
+  const auto entry = _lanes.find(agent);
+  if (entry != _lanes.end()) {
+    entry->second.isOrphan = true;
+    _mayHaveOrphans = true;
+  }
+}
+
+void LaneSet::DropSpec(std::uint64_t spec) {
+  _shares.erase(spec);
+}
+
+Lane& LaneSet::GetLane(std::uint64_t agent) {
+  const auto entry = _lanes.find(agent);
+  if (entry != _lanes.end()) {
+    return *entry->second.lane;
+  }
+  auto lane = std::make_unique<Lane>(_poller, _owners);
+  return *_lanes.emplace(agent, LaneEntry{std::move(lane), false}).first->second.lane;
+}
+
+CURLSH* LaneSet::GetShare(std::uint64_t spec) {
+  ShareHandle& share = _shares[spec];
+  if (!share) {
+    share = CreateShare();
+  }
+  return share.get();
+}
+
+void LaneSet::Turn(int maxMilliseconds) {
+  RemoveOrphans();
+  for (const SocketEvent& event : _poller.Wait(GetTimeout(maxMilliseconds))) {
+    // An earlier event may have ended the socket of a later one.
+    const auto owner = _owners.find(event.socket);
+    if (owner != _owners.end()) {
+      owner->second->OnSocket(event);
+    }
+  }
+  RunDeadlines();
+}
+
+int LaneSet::GetTimeout(int maxMilliseconds) const {
+  int timeout = maxMilliseconds < 0 ? std::numeric_limits<int>::max() : maxMilliseconds;
+  bool isLimited = maxMilliseconds >= 0;
+  const Lane::Clock::time_point now = Lane::Clock::now();
+  for (const auto& entry : _lanes) {
+    if (entry.second.lane->GetDeadline()) {
+      timeout = std::min(timeout, CountMilliseconds(*entry.second.lane->GetDeadline() - now));
+      isLimited = true;
+    }
+  }
+  return isLimited ? timeout : -1;
+}
+
+void LaneSet::RunDeadlines() {
+  const Lane::Clock::time_point now = Lane::Clock::now();
+  for (const auto& entry : _lanes) {
+    Lane& lane = *entry.second.lane;
+    if (lane.GetDeadline() && *lane.GetDeadline() <= now) {
+      lane.OnDeadline();
+    }
+  }
+}
+
+void LaneSet::RemoveOrphans() {
+  if (!_mayHaveOrphans) {
+    return;
+  }
+  _mayHaveOrphans = false;
+  for (auto entry = _lanes.begin(); entry != _lanes.end();) {
+    const bool isOrphan = entry->second.isOrphan;
+    const bool isDone = isOrphan && entry->second.lane->IsIdle();
+    _mayHaveOrphans = _mayHaveOrphans || (isOrphan && !isDone);
+    entry = isDone ? _lanes.erase(entry) : std::next(entry);
+  }
+}
+
+}  // namespace Http
+}  // namespace Pelmar

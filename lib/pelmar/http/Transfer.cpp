@@ -1,0 +1,263 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "pelmar/http/Transfer.h"
+
+#include "pelmar/http/ClientResponseImpl.h"
+#include "pelmar/http/TransferFailure.h"
+#include "pelmar/http/UrlSyntax.h"
+
+#include <pelmar/StringUtil.h>
+
+#include <algorithm>
+#include <exception>
+#include <utility>
+
+namespace Pelmar {
+namespace Http {
+
+namespace {
+
+constexpr long kOn = 1;
+constexpr long kOff = 0;
+/// The host name of the certificate is checked.
+constexpr long kVerifyHost = 2;
+
+// The list is given to the owner only when the new line is in it; on failure the engine leaves the list as it was.
+void Append(TextList& list, const std::string& line) {
+  curl_slist* const longer = curl_slist_append(list.get(), line.c_str());
+  if (longer == nullptr) {
+    throw std::bad_alloc();
+  }
+  list.release();
+  list.reset(longer);
+}
+
+bool HasHeader(const RequestParts& request, const std::string& lowerName) {
+  return std::any_of(request.headers.begin(), request.headers.end(),
+                     [&](const auto& header) { return StringUtil::ToLower(header.first) == lowerName; });
+}
+
+}  // namespace
+
+Transfer::Transfer(const Ref<Exchange>& exchange, CURLSH* share) : _exchange(exchange), _easy(curl_easy_init()) {
+  if (!_easy) {
+    throw HttpException("The HTTP engine cannot be set up");
+  }
+  Set(CURLOPT_ERRORBUFFER, _engineText);
+  Set(CURLOPT_PRIVATE, this);
+  Set(CURLOPT_SHARE, share);
+  SetIsolation();
+  SetAddress();
+  SetRequest();
+  SetHeaders();
+  if (_exchange->GetAgent().spec->IsTls()) {
+    SetTls();
+  }
+  SetReceivers();
+  SetCookies();
+}
+
+template <typename T>
+void Transfer::Set(CURLoption option, T value) {
+  const CURLcode code = curl_easy_setopt(_easy.get(), option, value);
+  if (code != CURLE_OK) {
+    throw HttpException(std::string("The HTTP engine refuses a setting: ") + curl_easy_strerror(code));
+  }
+}
+
+/// Nothing but the spec decides where a request goes and how.
+void Transfer::SetIsolation() {
+  Set(CURLOPT_NOSIGNAL, kOn);
+  Set(CURLOPT_FOLLOWLOCATION, kOff);
+  Set(CURLOPT_PROXY, "");  // An empty text, unlike none, keeps the environment's proxies out.
+  Set(CURLOPT_NETRC, static_cast<long>(CURL_NETRC_IGNORED));
+  Set(CURLOPT_HTTP_VERSION, static_cast<long>(CURL_HTTP_VERSION_1_1));
+  Set(CURLOPT_HTTP09_ALLOWED, kOff);
+  Set(CURLOPT_CONNECTTIMEOUT, kMaxConnectSeconds);
+  Set(CURLOPT_TCP_NODELAY, kOn);
+  Set(CURLOPT_TCP_KEEPALIVE, kOn);  // Nobody may be waiting with a time-out: a vanished peer shall be noticed.
+  // A cancelled exchange must not hold up the loop until its name look-up returns.
+  Set(CURLOPT_QUICK_EXIT, kOn);
+}
+
+void Transfer::SetAddress() {
+  const ConnectionSpecImpl& spec = *_exchange->GetAgent().spec;
+  const std::string& path = _exchange->GetRequest().path;
+  const char* const scheme = spec.IsTls() ? "https" : "http";
+  const std::string url = scheme + ("://" + FormatEndpoint(spec.GetServerName(), spec.GetPort())) + path;
+  Set(CURLOPT_PROTOCOLS_STR, scheme);
+  Set(CURLOPT_PATH_AS_IS, kOn);
+  Set(CURLOPT_URL, url.c_str());
+  Set(CURLOPT_REQUEST_TARGET, path.c_str());
+  if (spec.GetServerName() != spec.GetHost()) {
+    Append(_route, "::" + spec.GetEndpoint());
+    Set(CURLOPT_CONNECT_TO, _route.get());
+  }
+}
+
+void Transfer::SetRequest() {
+  const RequestParts& request = _exchange->GetRequest();
+  if (request.method == METHOD_POST) {
+    Set(CURLOPT_POST, kOn);
+    Set(CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(request.body.size()));
+    Set(CURLOPT_POSTFIELDS, request.body.c_str());
+  } else {
+    Set(CURLOPT_HTTPGET, kOn);
+  }
+}
+
+void Transfer::SetHeaders() {
+  const RequestParts& request = _exchange->GetRequest();
+  // Without it a server may choose any content coding (RFC 9110, section 12.5.3); we decode none.
+  Append(_headers, "Accept-Encoding: identity");
+  // A name with a colon and nothing else takes out what the engine would add on its own.
+  Append(_headers, "Expect:");
+  for (const char* const name : {"accept", "content-type"}) {
+    if (!HasHeader(request, name)) {
+      Append(_headers, std::string(name) + ":");
+    }
+  }
+  for (const auto& header : request.headers) {
+    // The engine's notation for an empty value.
+    const bool isBlank = header.second.find_first_not_of(' ') == std::string::npos;
+    Append(_headers, isBlank ? header.first + ";" : header.first + ": " + header.second);
+  }
+  Set(CURLOPT_HTTPHEADER, _headers.get());
+}
+
+void Transfer::SetTls() {
+  const ConnectionSpecImpl& spec = *_exchange->GetAgent().spec;
+  _tls = std::make_shared<TlsRecord>();
+  Set(CURLOPT_SSL_VERIFYPEER, kOn);
+  Set(CURLOPT_SSL_VERIFYHOST, kVerifyHost);
+  Set(CURLOPT_SSLVERSION, static_cast<long>(CURL_SSLVERSION_TLSv1_2));
+  // The anchors come from the SSL context alone, and are not to be mixed with another context's.
+  Set(CURLOPT_CAINFO, static_cast<char*>(nullptr));
+  Set(CURLOPT_CAPATH, static_cast<char*>(nullptr));
+  Set(CURLOPT_CA_CACHE_TIMEOUT, kOff);
+  if (!spec.GetPins().empty()) {
+    Set(CURLOPT_PINNEDPUBLICKEY, spec.GetPins().c_str());
+  }
+  Set(CURLOPT_SSL_CTX_FUNCTION, &Transfer::OnTlsContext);
+  Set(CURLOPT_SSL_CTX_DATA, this);
+}
+
+void Transfer::SetReceivers() {
+  Set(CURLOPT_HEADERFUNCTION, &Transfer::OnHeader);
+  Set(CURLOPT_HEADERDATA, this);
+  Set(CURLOPT_WRITEFUNCTION, &Transfer::OnBody);
+  Set(CURLOPT_WRITEDATA, this);
+  // An announced length beyond the bound is refused before the first byte of the body.
+  Set(CURLOPT_MAXFILESIZE_LARGE, static_cast<curl_off_t>(kMaxResponseBytes));
+}
+
+void Transfer::SetCookies() {
+  Set(CURLOPT_COOKIEFILE, "");  // Reads no file, but handles cookies.
+  _cookiesBefore = _exchange->GetAgent().cookies->GetLines();
+  // The engine sends the one it was given last first; older cookies belong before newer ones (RFC 6265, section 5.4, step 2).
+  for (auto line = _cookiesBefore.rbegin(); line != _cookiesBefore.rend(); ++line) {
+    Set(CURLOPT_COOKIELIST, line->c_str());
+  }
+}
+
+// Returning less than was offered makes the engine give the exchange up. No exception may pass through it.
+std::size_t Transfer::OnHeader(char* data, std::size_t size, std::size_t count, void* transfer) noexcept {
+  try {
+    auto* const self = static_cast<Transfer*>(transfer);
+    self->NoteConnection();
+    return self->_head.TakeLine(data, size * count) == HeadFault::NONE ? size * count : 0;
+  } catch (const std::exception&) {
+    return 0;
+  }
+}
+
+std::size_t Transfer::OnBody(char* data, std::size_t size, std::size_t count, void* transfer) noexcept {
+  try {
+    auto* const self = static_cast<Transfer*>(transfer);
+    if (size * count > kMaxResponseBytes - self->_body.size()) {
+      self->_isBodyTooLarge = true;
+      return 0;
+    }
+    self->_body.append(data, size * count);
+    return size * count;
+  } catch (const std::exception&) {
+    return 0;
+  }
+}
+
+CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
+  auto* const self = static_cast<Transfer*>(transfer);
+  try {
+    const ConnectionSpecImpl& spec = *self->_exchange->GetAgent().spec;
+    ConfigureTls(static_cast<ssl_ctx_st*>(tls), *spec.GetContext(), spec.GetServerName(), self->_tls);
+    return CURLE_OK;
+  } catch (const Exception& e) {
+    self->_tlsSetupFault = e.what();
+  } catch (const std::exception&) {
+    self->_tlsSetupFault = "TLS cannot be set up";
+  }
+  return CURLE_SSL_CERTPROBLEM;
+}
+
+void Transfer::Finish(CURLcode code) {
+  SaveCookies();
+  if (HasSucceeded(code)) {
+    _exchange->Settle(nullptr, MakeRef<ClientResponseImpl>(_head.GetStatusCode(), _head.GetReason(), std::move(_body)));
+  } else {
+    _exchange->Settle(DescribeFailure(code), nullptr);
+  }
+}
+
+/// The engine tells the connection only while the exchange runs.
+void Transfer::NoteConnection() {
+  curl_tlssessioninfo* session = nullptr;
+  if (_tls && !_connectionTls && curl_easy_getinfo(_easy.get(), CURLINFO_TLS_SSL_PTR, &session) == CURLE_OK &&
+      session->internals != nullptr) {
+    _connectionTls = GetTlsRecord(static_cast<const ssl_st*>(session->internals));
+  }
+}
+
+void Transfer::SaveCookies() {
+  curl_slist* lines = nullptr;
+  if (curl_easy_getinfo(_easy.get(), CURLINFO_COOKIELIST, &lines) != CURLE_OK) {
+    return;
+  }
+  const TextList owner(lines);
+  std::vector<std::string> after;
+  for (const curl_slist* line = lines; line != nullptr; line = line->next) {
+    after.emplace_back(line->data);
+  }
+  _exchange->GetAgent().cookies->Merge(_cookiesBefore, after);
+}
+
+bool Transfer::HasSucceeded(CURLcode code) const {
+  if (code != CURLE_OK || !_head.IsComplete() || _head.GetFault() != HeadFault::NONE) {
+    return false;
+  }
+  // Anyone on the way can end the TCP connection, so with TLS only close_notify shows that the body is whole (RFC 9112, section 9.8).
+  return !_tls || !_head.IsEndedByConnection() || (_connectionTls && _connectionTls->hasServerEnded);
+}
+
+std::shared_ptr<const HttpException> Transfer::DescribeFailure(CURLcode code) const {
+  if (!_tlsSetupFault.empty()) {
+    return std::make_shared<const HttpException>(_tlsSetupFault);
+  }
+  const ConnectionSpecImpl& spec = *_exchange->GetAgent().spec;
+  long systemError = 0;
+  curl_easy_getinfo(_easy.get(), CURLINFO_OS_ERRNO, &systemError);
+  TransferFacts facts;
+  facts.code = code;
+  facts.engineText = _engineText;
+  facts.systemError = static_cast<int>(systemError);
+  facts.host = spec.GetHost();
+  facts.endpoint = spec.GetEndpoint();
+  facts.serverName = spec.GetServerName();
+  facts.head = _head;
+  facts.isBodyTooLarge = _isBodyTooLarge;
+  facts.tls = _tls;
+  return Http::DescribeFailure(facts);
+}
+
+}  // namespace Http
+}  // namespace Pelmar

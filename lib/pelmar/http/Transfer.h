@@ -1,0 +1,75 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// The HTTP engine's side of one exchange: its settings, and what it has received so far.
+
+#ifndef PELMAR_HTTP_TRANSFER_H
+#define PELMAR_HTTP_TRANSFER_H
+
+#include "pelmar/http/CurlHandles.h"
+#include "pelmar/http/Exchange.h"
+#include "pelmar/http/ResponseHead.h"
+#include "pelmar/http/TlsRecord.h"
+
+#include <cstddef>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace Pelmar {
+namespace Http {
+
+/// Lives on the HTTP loop's thread.
+class Transfer final {
+ public:
+  /// `share` keeps the TLS sessions and addresses of the spec. Throws HttpException when the engine refuses a setting.
+  Transfer(const Ref<Exchange>& exchange, CURLSH* share);
+  Transfer(const Transfer&) = delete;
+  Transfer& operator=(const Transfer&) = delete;
+  ~Transfer() = default;
+
+  CURL* GetHandle() const { return _easy.get(); }
+  const Ref<Exchange>& GetExchange() const { return _exchange; }
+
+  /// Takes the cookies over and settles the exchange.
+  void Finish(CURLcode code);
+
+ private:
+  template <typename T>
+  void Set(CURLoption option, T value);
+  void SetAddress();
+  void SetIsolation();
+  void SetRequest();
+  void SetHeaders();
+  void SetTls();
+  void SetReceivers();
+  void SetCookies();
+
+  static std::size_t OnHeader(char* data, std::size_t size, std::size_t count, void* transfer) noexcept;
+  static std::size_t OnBody(char* data, std::size_t size, std::size_t count, void* transfer) noexcept;
+  static CURLcode OnTlsContext(CURL* easy, void* tls, void* transfer) noexcept;
+
+  void NoteConnection();
+  void SaveCookies();
+  bool HasSucceeded(CURLcode code) const;
+  std::shared_ptr<const HttpException> DescribeFailure(CURLcode code) const;
+
+  const Ref<Exchange> _exchange;
+  char _engineText[CURL_ERROR_SIZE] = "";
+  TextList _headers;
+  TextList _route;
+  std::vector<std::string> _cookiesBefore;
+  ResponseHead _head;
+  std::string _body;
+  bool _isBodyTooLarge = false;
+  std::shared_ptr<TlsRecord> _tls;
+  std::shared_ptr<const TlsRecord> _connectionTls;  // Another's if the connection was open already.
+  std::string _tlsSetupFault;
+  // Last, so that it goes first: it refers to the members above.
+  EasyHandle _easy;
+};
+
+}  // namespace Http
+}  // namespace Pelmar
+
+#endif  // PELMAR_HTTP_TRANSFER_H

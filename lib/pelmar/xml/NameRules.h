@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// What Namespaces in XML 1.0 says about names and about declarations, one name at a time.
+
+#ifndef PELMAR_XML_NAMERULES_H
+#define PELMAR_XML_NAMERULES_H
+
+#include <string>
+#include <string_view>
+
+namespace Pelmar {
+namespace Xml {
+
+constexpr const char* kXmlNamespace = "http://www.w3.org/XML/1998/namespace";
+constexpr const char* kXmlnsNamespace = "http://www.w3.org/2000/xmlns/";
+
+/// A name cut at its first colon; the views are into the name.
+struct NameParts {
+  std::string_view prefix;  // Empty when there is no colon.
+  std::string_view localName;
+};
+
+NameParts SplitName(std::string_view name) noexcept;
+
+/// Whether an attribute of this name declares a namespace; then `prefix` is the declared one, empty for the
+/// default namespace.
+bool IsNamespaceDeclaration(std::string_view attributeName, std::string_view& prefix) noexcept;
+
+/// Whether `name`, known to be a Name of XML 1.0, is also a QName: at most one colon, and a name on both
+/// sides of it (Namespaces in XML 1.0, section 4).
+bool IsQualifiedName(std::string_view name) noexcept;
+
+/// What is wrong with binding `prefix` (empty: the default namespace) to `uri`; null when nothing is
+/// (Namespaces in XML 1.0, sections 2.2 and 3).
+const char* FindDeclarationFault(std::string_view prefix, std::string_view uri) noexcept;
+
+/// Whether `name` is a Name of XML 1.0 without a colon, as the parser would accept it.
+bool IsNcName(const std::string& name);
+
+}  // namespace Xml
+}  // namespace Pelmar
+
+#endif  // PELMAR_XML_NAMERULES_H
