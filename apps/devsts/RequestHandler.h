@@ -1,0 +1,64 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// Turns requests into answers. Knows nothing of networks.
+
+#ifndef QUORLIN_DEVSTS_REQUESTHANDLER_H
+#define QUORLIN_DEVSTS_REQUESTHANDLER_H
+
+#include "devsts/Authentication.h"
+#include "devsts/Clock.h"
+#include "devsts/Directory.h"
+#include "devsts/Grant.h"
+#include "devsts/RequestLog.h"
+#include "devsts/TokenIssuer.h"
+#include "devsts/TokenRequest.h"
+
+#include <string>
+
+namespace DevSts {
+
+/// An HTTP answer.
+struct Answer {
+  int status = 0;
+  std::string contentType;
+  std::string body;
+};
+
+struct HandlerOptions {
+  LifetimeLimits lifetime;
+  /// By how many seconds a client's clock may differ.
+  long long maxClockSkewSec = 5 * 60;
+};
+
+/// The service's logic. Safe to use from any thread.
+class RequestHandler final {
+ public:
+  /// Clock and sink may be called from several threads at once; the sink may be empty.
+  RequestHandler(const HandlerOptions& options, const Directory& directory, const TokenIssuer& issuer,
+                 const Clock& clock, const LogSink& log);
+
+  /// Answers one request, given the values of its SOAPAction and Content-Type headers as they came (empty:
+  /// missing) and its body. Never throws: what cannot be granted is answered by a SOAP fault with status 500
+  /// (SOAP 1.1, section 6.2), a content type that is not text/xml by 415. Writes one line to the log.
+  Answer HandleRequest(const std::string& soapAction, const std::string& contentType,
+                       const std::string& body);
+
+ private:
+  Answer Respond(const std::string& soapAction, const std::string& contentType, const std::string& body,
+                 RequestRecord& record);
+  std::string Process(const std::string& soapAction, const std::string& body, RequestRecord& record);
+  std::string Issue(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
+                    RequestRecord& record);
+
+  HandlerOptions _options;
+  Directory _directory;
+  TokenIssuer _issuer;
+  Clock _clock;
+  LogSink _log;
+  ReplayGuard _replays;
+};
+
+}  // namespace DevSts
+
+#endif  // QUORLIN_DEVSTS_REQUESTHANDLER_H

@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// One line of JSON for each request: what was asked, what was checked, what was answered. Never a password, a
+// key or a token.
+
+#ifndef QUORLIN_DEVSTS_REQUESTLOG_H
+#define QUORLIN_DEVSTS_REQUESTLOG_H
+
+#include <functional>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace DevSts {
+
+/// Takes a line without its line feed. Called from several threads at once.
+using LogSink = std::function<void(const std::string& line)>;
+
+/// Collects what happened to one request.
+class RequestRecord final {
+ public:
+  /// `operation`: "issue", "renew", ...
+  void SetOperation(const std::string& operation) { _operation = operation; }
+  /// Only for users of the directory: an unknown name may be a password typed into the wrong field.
+  void SetUser(const std::string& upn) { _user = upn; }
+  /// A check that passed.
+  void AddPassed(const std::string& check) { _passed.push_back(check); }
+  /// The answer; `fault` is empty for a granted request.
+  void SetAnswer(int status, const std::string& fault, const std::string& reason);
+
+  std::string ToJson(long long now) const;
+
+ private:
+  std::string _operation;
+  std::string _user;
+  std::vector<std::string> _passed;
+  int _status = 0;
+  std::string _fault;
+  std::string _reason;
+};
+
+}  // namespace DevSts
+
+#endif  // QUORLIN_DEVSTS_REQUESTLOG_H

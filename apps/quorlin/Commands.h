@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// The program's commands. Each adds itself and its flags to the command line, and gives back what to run when
+// it is chosen.
+
+#ifndef QUORLIN_CLI_COMMANDS_H
+#define QUORLIN_CLI_COMMANDS_H
+
+#include <CLI/CLI.hpp>
+
+#include <functional>
+#include <vector>
+
+namespace Cli {
+
+/// A command of the command line and what it does. `run` returns the exit code and is called after the
+/// arguments were read.
+struct Command {
+  CLI::App* app;
+  std::function<int()> run;
+};
+
+/// acquire password
+std::vector<Command> AddAcquireCommands(CLI::App& app);
+/// verify
+Command AddVerifyCommand(CLI::App& app);
+/// sts
+Command AddStsCommand(CLI::App& app);
+/// demo
+Command AddDemoCommand(CLI::App& app);
+
+}  // namespace Cli
+
+#endif  // QUORLIN_CLI_COMMANDS_H

@@ -1,0 +1,90 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "quorlin/Failure.h"
+
+#include <pelmar/http/HttpException.h>
+#include <pelmar/xml/Parser.h>
+#include <quorlin/Exceptions.h>
+
+#include <cxxabi.h>
+
+#include <cstdlib>
+#include <memory>
+#include <typeinfo>
+
+namespace Cli {
+
+namespace {
+
+std::string GetUnqualifiedName(const std::type_info& type) {
+  int status = 0;
+  const std::unique_ptr<char, void (*)(void*)> name(
+      abi::__cxa_demangle(type.name(), nullptr, nullptr, &status), std::free);
+  const std::string text = name != nullptr ? name.get() : type.name();
+  const std::size_t colon = text.rfind("::");
+  return colon == std::string::npos ? text : text.substr(colon + 2);
+}
+
+template <typename T>
+bool Is(const std::exception& e) {
+  return dynamic_cast<const T*>(&e) != nullptr;
+}
+
+/// A bad URL is the only thing that the HTTP layer reports to a caller of the library.
+bool IsUsage(const std::exception& e) {
+  return Is<UsageException>(e) || Is<Pelmar::InvalidArgumentException>(e) ||
+         Is<Pelmar::InvalidStateException>(e) || Is<Pelmar::Http::HttpException>(e);
+}
+
+ExitCode GetExitCode(const std::exception& e, ExitCode otherwise) {
+  if (Is<Quorlin::CommunicationException>(e)) {
+    return EXIT_UNREACHABLE;
+  }
+  if (Is<Quorlin::SsoException>(e) || Is<Pelmar::Xml::XMLParseException>(e)) {
+    return EXIT_REFUSED;
+  }
+  if (IsUsage(e)) {
+    return EXIT_USAGE;
+  }
+  return Is<Pelmar::Exception>(e) ? otherwise : EXIT_FAILED;
+}
+
+std::string GetAdvice(const std::exception& e) {
+  if (Is<Quorlin::CommunicationException>(e)) {
+    return "Check the URL and that the service is running; for https, that --ca names the authority of its certificate "
+           "and that the URL's host is one that the certificate is for.";
+  }
+  if (Is<Quorlin::InvalidCredentialsException>(e)) {
+    return "Check the user name and the password.";
+  }
+  if (Is<Quorlin::InvalidSignatureException>(e)) {
+    return "The token must be signed with a trusted certificate: check the file given with --sts-cert or --trust, and "
+           "that the token was not changed on its way.";
+  }
+  return "";
+}
+
+Failure Describe(const std::exception& e, ExitCode otherwise) {
+  return {GetUnqualifiedName(typeid(e)), e.what(), false, GetExitCode(e, otherwise), GetAdvice(e)};
+}
+
+}  // namespace
+
+Failure DescribeCurrentException(ExitCode otherwise) {
+  try {
+    throw;
+  } catch (const std::exception& e) {
+    return Describe(e, otherwise);
+  } catch (const Pelmar::Exception* e) {
+    // Some errors of the token parser are thrown by pointer; whoever catches one owns it.
+    const std::unique_ptr<const Pelmar::Exception> owner(e);
+    Failure failure = Describe(*e, otherwise);
+    failure.byPointer = true;
+    return failure;
+  } catch (...) {
+    return {"unknown", "something was thrown that is no exception", false, EXIT_FAILED, ""};
+  }
+}
+
+}  // namespace Cli

@@ -1,0 +1,159 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "quorlin/Files.h"
+
+#include "quorlin/Failure.h"
+
+#include <pelmar/crypto/CryptoException.h>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <utility>
+
+namespace Cli {
+
+namespace {
+
+[[noreturn]] void Refuse(const std::string& what, const std::string& path, int error) {
+  throw UsageException("cannot " + what + " " + path + ": " + std::strerror(error));
+}
+
+class Descriptor final {
+ public:
+  explicit Descriptor(int number) : _number(number) {}
+  Descriptor(const Descriptor&) = delete;
+  Descriptor& operator=(const Descriptor&) = delete;
+  ~Descriptor() {
+    if (_number > STDERR_FILENO) {
+      close(_number);
+    }
+  }
+  int Get() const { return _number; }
+
+ private:
+  int _number;
+};
+
+int OpenForReading(const std::string& path) {
+  return path == "-" ? STDIN_FILENO : open(path.c_str(), O_RDONLY | O_CLOEXEC);
+}
+
+mode_t GetMode(Readers readers) {
+  return readers == Readers::OWNER ? S_IRUSR | S_IWUSR : S_IRUSR | S_IWUSR | S_IRGRP | S_IROTH;
+}
+
+bool IsSpecialFile(const std::string& path) {
+  struct stat status;
+  return stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode);
+}
+
+void WriteAll(int descriptor, const std::string& content, const std::string& path) {
+  std::size_t written = 0;
+  while (written < content.size()) {
+    const ssize_t count = write(descriptor, content.data() + written, content.size() - written);
+    if (count < 0 && errno != EINTR) {
+      Refuse("write", path, errno);
+    }
+    written += count > 0 ? static_cast<std::size_t>(count) : 0;
+  }
+}
+
+}  // namespace
+
+std::string ReadFileUpTo(const std::string& path, std::size_t maxBytes) {
+  const Descriptor file(OpenForReading(path));
+  if (file.Get() < 0) {
+    Refuse("read", path, errno);
+  }
+  std::string content;
+  std::array<char, 65536> buffer;
+  while (content.size() < maxBytes) {
+    const ssize_t count = read(file.Get(), buffer.data(), std::min(buffer.size(), maxBytes - content.size()));
+    if (count < 0 && errno != EINTR) {
+      Refuse("read", path, errno);
+    }
+    if (count == 0) {
+      break;
+    }
+    content.append(buffer.data(), count > 0 ? static_cast<std::size_t>(count) : 0);
+  }
+  return content;
+}
+
+std::string ReadFile(const std::string& path, std::size_t maxBytes) {
+  std::string content = ReadFileUpTo(path, maxBytes + 1);
+  if (content.size() > maxBytes) {
+    throw UsageException(path + " is larger than " + std::to_string(maxBytes) + " bytes");
+  }
+  return content;
+}
+
+std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> ReadCertificates(
+    const std::vector<std::string>& paths) {
+  std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> certificates;
+  for (const std::string& path : paths) {
+    try {
+      certificates.splice(certificates.end(), Pelmar::Crypto::CreateCertificatesFromPem(ReadFile(path)));
+    } catch (const Pelmar::Crypto::CryptoException& e) {
+      throw UsageException("cannot use the certificates in " + path + ": " + e.what());
+    }
+  }
+  return certificates;
+}
+
+OutputFile::OutputFile(const std::string& path, Readers readers) : _path(path), _descriptor(-1) {
+  if (IsSpecialFile(path)) {
+    _descriptor = open(path.c_str(), O_WRONLY | O_CLOEXEC);
+  } else {
+    std::string pattern = path + ".XXXXXX";
+    _descriptor = mkostemp(pattern.data(), O_CLOEXEC);
+    _temporaryPath = pattern;
+  }
+  const bool isOpen =
+      _descriptor >= 0 && (_temporaryPath.empty() || fchmod(_descriptor, GetMode(readers)) == 0);
+  if (!isOpen) {
+    const int error = errno;
+    Discard();
+    Refuse("write", path, error);
+  }
+}
+
+OutputFile::~OutputFile() {
+  Discard();
+}
+
+void OutputFile::Discard() {
+  if (_descriptor >= 0) {
+    close(_descriptor);
+    if (!_temporaryPath.empty()) {
+      unlink(_temporaryPath.c_str());
+    }
+  }
+}
+
+void OutputFile::Commit(const std::string& content) {
+  WriteAll(_descriptor, content, _path);
+  if (_temporaryPath.empty()) {
+    return;
+  }
+  // Without this a crash of the machine could leave the new name on an empty file.
+  if (fsync(_descriptor) != 0 || std::rename(_temporaryPath.c_str(), _path.c_str()) != 0) {
+    Refuse("write", _path, errno);
+  }
+  close(std::exchange(_descriptor, -1));
+}
+
+void WriteFile(const std::string& path, const std::string& content, Readers readers) {
+  OutputFile(path, readers).Commit(content);
+}
+
+}  // namespace Cli

@@ -1,0 +1,108 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "quorlin/Options.h"
+
+#include "quorlin/Failure.h"
+#include "quorlin/Files.h"
+
+#include <pelmar/StringUtil.h>
+#include <pelmar/crypto/CryptoException.h>
+#include <pelmar/service/Logger.h>
+
+namespace Cli {
+
+namespace {
+
+bool HasScheme(const std::string& url, const std::string& scheme) {
+  return Pelmar::StringUtil::ToLower(url.substr(0, scheme.size())) == scheme;
+}
+
+Pelmar::Ref<Pelmar::Ssl::SSLContext> MakeSslContext(const ServiceOptions& options) {
+  Pelmar::Ssl::SSLContextOptions contextOptions;
+  contextOptions.trustAnchors = ReadCertificates(options.caFiles);
+  contextOptions.useSystemStore = options.caFiles.empty();
+  try {
+    return Pelmar::Ssl::CreateSSLContext(contextOptions);
+  } catch (const Pelmar::Crypto::CryptoException& e) {
+    throw UsageException(std::string("cannot set up TLS: ") + e.what());
+  }
+}
+
+}  // namespace
+
+CLI::Option* AddRepeatable(CLI::App& command, const std::string& name, std::vector<std::string>& values,
+                           const std::string& description) {
+  // Without this, "--ca a.pem token.xml" would take both.
+  return command.add_option(name, values, description)->allow_extra_args(false)->type_size(1);
+}
+
+void AddServiceOptions(CLI::App& command, ServiceOptions& options) {
+  command.add_option("--url", options.url, "The token service, http: or https:")
+      ->required()
+      ->type_name("URL");
+  AddRepeatable(
+      command, "--ca", options.caFiles,
+      "Trust the TLS servers of these authorities; without it, those the system trusts. May be repeated")
+      ->type_name("PEM");
+  AddRepeatable(command, "--sts-cert", options.stsCertificateFiles,
+                "Accept tokens signed with these certificates or by their authorities. May be repeated")
+      ->required()
+      ->type_name("PEM");
+}
+
+Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& options) {
+  Quorlin::SecurityTokenServiceConfig config;
+  config.stsUrl = options.url;
+  config.trustedStsCertificates = ReadCertificates(options.stsCertificateFiles);
+  if (!IsPlainHttp(options)) {
+    config.sslContext = MakeSslContext(options);
+  }
+  return config;
+}
+
+bool IsPlainHttp(const ServiceOptions& options) {
+  return HasScheme(options.url, "http:");
+}
+
+void AddTokenOptions(CLI::App& command, TokenOptions& options) {
+  command.add_option("--lifetime", options.lifetimeSec, "How long the token shall be valid, in seconds")
+      ->type_name("SEC")
+      ->capture_default_str();
+  command.add_flag("--renewable", options.renewable, "Ask for a token that can be renewed");
+  command.add_flag("--delegable", options.delegable, "Ask for a token that can be delegated further");
+  command
+      .add_option("--delegate-to", options.delegateTo, "Ask for a token with which NAME may act for the user")
+      ->type_name("NAME");
+  AddRepeatable(command, "--audience", options.audience,
+                "Restrict the token to this service. May be repeated")
+      ->type_name("URI");
+}
+
+Quorlin::TokenSpec MakeTokenSpec(const TokenOptions& options) {
+  Quorlin::TokenSpec spec;
+  spec.tokenLifetimeSec = options.lifetimeSec;
+  spec.renewable = options.renewable;
+  spec.delegable = options.delegable;
+  if (!options.delegateTo.empty()) {
+    spec.delegateTo = options.delegateTo;
+  }
+  spec.audienceRestriction.insert(options.audience.begin(), options.audience.end());
+  return spec;
+}
+
+void AddOutputOptions(CLI::App& command, OutputOptions& options) {
+  command.add_option("--out", options.file, "Write the token's XML to this file, which only you may read")
+      ->type_name("FILE");
+  command.add_flag("--json", options.json, "Print one JSON object instead of a summary");
+}
+
+void AddLogOption(CLI::App& command) {
+  // The platform's own sink writes to standard error and escapes what could steer a terminal.
+  const auto enable = [](std::int64_t) {
+    Pelmar::Service::GetApp()->GetLogManager()->SetEnabledLevels(Pelmar::Service::kAllLogLevels);
+  };
+  command.add_flag_function("--log", enable, "Show the library's log lines on standard error");
+}
+
+}  // namespace Cli
