@@ -20,7 +20,7 @@ void RequireEmpty(const ElementNode& element) {
   SignatureChildren(element).RequireEnd();
 }
 
-/// The words of an XML list (XML Schema Part 2, section 2.5.1.2).
+/// The words of a list as XML Schema separates them: by white space.
 std::vector<std::string> SplitList(const std::string& text) {
   constexpr const char* kWhiteSpace = " \t\r\n";
   std::vector<std::string> words;
