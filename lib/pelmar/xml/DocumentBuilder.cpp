@@ -76,7 +76,12 @@ Ref<Object> DocumentBuilder::GetResult() {
 }
 
 void DocumentBuilder::Append(Node* node) {
-  _current->AppendChild(Ref<Node>(node));
+  if (_current == _document.Get()) {
+    _current->AppendChild(Ref<Node>(node));
+  } else {
+    _current->LinkLast(
+        node);  // A new node below an element: nothing to check, and no other owner to count in and out.
+  }
 }
 
 }  // namespace Xml

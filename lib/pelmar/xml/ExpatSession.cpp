@@ -32,7 +32,7 @@ std::size_t CountAttributes(const char* const* attributes) noexcept {
 
 ExpatSession::ExpatSession(XMLHandler* handler, std::string_view text)
     : _parser(CreateExpat()), _handler(handler), _text(text), _place(text.data()) {
-  XML_Parser const parser = _parser.get();
+  XML_ParserStruct* const parser = _parser.get();
   XML_SetUserData(parser, this);
   XML_SetElementHandler(parser, OnStartElement, OnEndElement);
   XML_SetCharacterDataHandler(parser, OnCharacters);

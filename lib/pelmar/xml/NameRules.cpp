@@ -24,6 +24,11 @@ bool MayContinueName(char c) noexcept {
   return !IsAscii(c) || IsAsciiLetter(c) || (c >= '0' && c <= '9') || c == '_' || c == '-' || c == '.';
 }
 
+template <typename Predicate>
+bool ConsistsOf(std::string_view text, Predicate predicate) {
+  return std::all_of(text.begin(), text.end(), predicate);
+}
+
 // Of the characters that may stand in a name, those that must not begin one (XML 1.0, productions 4 and 4a).
 // Beyond ASCII they are U+00B7, U+0300 to U+036F, U+203F and U+2040.
 bool MayBeginName(std::string_view name) noexcept {
@@ -98,12 +103,12 @@ const char* FindDeclarationFault(std::string_view prefix, std::string_view uri) 
 }
 
 bool IsNcName(const std::string& name) {
-  constexpr std::size_t kMaxNameBytes = 64 * 1024;
+  constexpr std::size_t kMaxNameBytes = 65536;
   if (name.empty() || name.size() > kMaxNameBytes || !MayBeginName(name) ||
-      !std::all_of(name.begin(), name.end(), MayContinueName)) {
+      !ConsistsOf(name, [](char c) { return MayContinueName(c); })) {
     return false;
   }
-  return std::all_of(name.begin(), name.end(), IsAscii) || IsNameToTheParser(name);
+  return ConsistsOf(name, [](char c) { return IsAscii(c); }) || IsNameToTheParser(name);
 }
 
 }  // namespace Xml

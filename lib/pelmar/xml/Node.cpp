@@ -102,15 +102,20 @@ void ParentNode::AppendChild(const Ref<Node>& child) {
   if (GetKind() == DOCUMENT_NODE) {
     RequireChildOfDocument(static_cast<const Document*>(this), child.Get());
   }
-  Node* const node = child.Get();
-  node->AddRef();
-  if (node->_parent != nullptr) {
-    node->_parent->RemoveChild(node);
+  ParentNode* const parent = child->GetParent();
+  if (parent != nullptr) {
+    parent->RemoveChild(child.Get());  // The caller's reference keeps it alive.
   }
-  node->_parent = this;
-  node->_previousSibling = _lastChild;
-  (_lastChild != nullptr ? _lastChild->_nextSibling : _firstChild) = node;
-  _lastChild = node;
+  LinkLast(child.Get());
+}
+
+// `child` has no parent, and becomes this node's.
+void ParentNode::LinkLast(Node* child) noexcept {
+  child->AddRef();
+  child->_parent = this;
+  child->_previousSibling = _lastChild;
+  (_lastChild != nullptr ? _lastChild->_nextSibling : _firstChild) = child;
+  _lastChild = child;
   ++_childCount;
 }
 

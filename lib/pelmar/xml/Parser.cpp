@@ -41,7 +41,7 @@ constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 // Grows with what comes, so that a reader of little takes little; reads one byte beyond the limit to know
 // that there is more.
 std::string Drain(Reader* reader) {
-  constexpr std::size_t kFirstBufferBytes = 16 * 1024;
+  constexpr std::size_t kFirstBufferBytes = 16384;
   std::string text;
   std::size_t used = 0;
   for (;;) {

@@ -4,6 +4,7 @@
 #include "pelmar/xml/TextPlace.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
 
 namespace Pelmar {
@@ -15,13 +16,31 @@ bool Contains(const char* text, std::size_t size, char byte) noexcept {
   return std::memchr(text, byte, size) != nullptr;
 }
 
-// Every byte of UTF-8 begins a character but those of the form 10xxxxxx. A loop that the compiler turns into vector code.
+// Every byte of UTF-8 begins a character but those of the form 10xxxxxx.
+bool ContinuesCharacter(char byte) noexcept {
+  return (static_cast<unsigned char>(byte) & 0xC0u) == 0x80u;
+}
+
+// The same for eight bytes at once: how many of them continue a character.
+unsigned long CountContinuations(const char* text) noexcept {
+  constexpr std::uint64_t kLowBits = 0x0101010101010101u;
+  std::uint64_t bytes = 0;
+  std::memcpy(&bytes, text, sizeof(bytes));
+  const std::uint64_t marks = (bytes >> 7) & ~(bytes >> 6) & kLowBits;
+  // The product's highest byte is the sum of all bytes.
+  return static_cast<unsigned long>((marks * kLowBits) >> 56);
+}
+
 unsigned long CountCharacters(const char* text, std::size_t size) noexcept {
-  unsigned long count = 0;
-  for (std::size_t i = 0; i < size; ++i) {
-    count += (static_cast<unsigned char>(text[i]) & 0xC0u) != 0x80u ? 1 : 0;
+  unsigned long continuations = 0;
+  std::size_t i = 0;
+  for (; size - i >= sizeof(std::uint64_t); i += sizeof(std::uint64_t)) {
+    continuations += CountContinuations(text + i);
   }
-  return count;
+  for (; i < size; ++i) {
+    continuations += ContinuesCharacter(text[i]) ? 1 : 0;
+  }
+  return size - continuations;
 }
 
 }  // namespace

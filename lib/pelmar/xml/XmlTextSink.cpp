@@ -3,95 +3,74 @@
 
 #include "pelmar/xml/XmlTextSink.h"
 
-#include <cstring>
+#include <array>
 
 namespace Pelmar {
 namespace Xml {
 
 namespace {
 
-// What stands for a byte in text and in attribute values; empty for a byte that stands for itself. Beyond the
-// characters that would be read as markup these are the white space that a parser would otherwise normalise
-// away.
-std::string_view EscapeInText(char byte) noexcept {
-  switch (byte) {
-    case '&':
-      return "&amp;";
-    case '<':
-      return "&lt;";
-    case '>':
-      return "&gt;";
-    case '\r':
-      return "&#xD;";
-    default:
-      return std::string_view();
-  }
+// What stands for each byte; null for a byte that stands for itself. One look-up for every byte of every
+// text: a comparison first would be a branch that no processor can predict.
+using Escapes = std::array<const char*, 256>;
+
+// Beyond the characters that would be read as markup these are the white space that a parser would otherwise
+// normalise away.
+constexpr Escapes MakeTextEscapes() noexcept {
+  Escapes escapes = {};
+  escapes['&'] = "&amp;";
+  escapes['<'] = "&lt;";
+  escapes['>'] = "&gt;";
+  escapes['\r'] = "&#xD;";
+  return escapes;
 }
 
-std::string_view EscapeInAttribute(char byte) noexcept {
-  switch (byte) {
-    case '&':
-      return "&amp;";
-    case '<':
-      return "&lt;";
-    case '"':
-      return "&quot;";
-    case '\t':
-      return "&#x9;";
-    case '\n':
-      return "&#xA;";
-    case '\r':
-      return "&#xD;";
-    default:
-      return std::string_view();
-  }
+constexpr Escapes MakeAttributeEscapes() noexcept {
+  Escapes escapes = {};
+  escapes['&'] = "&amp;";
+  escapes['<'] = "&lt;";
+  escapes['"'] = "&quot;";
+  escapes['\t'] = "&#x9;";
+  escapes['\n'] = "&#xA;";
+  escapes['\r'] = "&#xD;";
+  return escapes;
 }
+
+constexpr Escapes kTextEscapes = MakeTextEscapes();
+constexpr Escapes kAttributeEscapes = MakeAttributeEscapes();
 
 }  // namespace
 
-void XmlTextSink::Put(std::string_view bytes) {
-  if (bytes.empty()) {
-    return;  // An empty view may have no address, which memcpy does not allow.
+void XmlTextSink::PutBeyondBuffer(std::string_view bytes) {
+  Flush();
+  if (bytes.size() > _buffer.size()) {
+    _writer->Write(bytes.data(), bytes.size());
+    return;
   }
-  if (bytes.size() > _buffer.size() - _used) {
-    Flush();
-    if (bytes.size() > _buffer.size()) {
-      _writer->Write(bytes.data(), bytes.size());
-      return;
-    }
-  }
-  std::memcpy(_buffer.data() + _used, bytes.data(), bytes.size());
-  _used += bytes.size();
+  Put(bytes);
 }
 
-void XmlTextSink::Put(char byte) {
-  Put(std::string_view(&byte, 1));
-}
-
-template <typename Escape>
-void XmlTextSink::PutEscaped(std::string_view text, Escape escape) {
-  std::size_t start = 0;
-  for (std::size_t i = 0; i < text.size(); ++i) {
-    // All that is ever escaped lies at or below '>'.
-    if (static_cast<unsigned char>(text[i]) > '>') {
-      continue;
-    }
-    const std::string_view replacement = escape(text[i]);
-    if (!replacement.empty()) {
-      Put(text.substr(start, i - start));
-      Put(replacement);
-      start = i + 1;
+template <typename Escapes>
+void XmlTextSink::PutEscaped(std::string_view text, const Escapes& escapes) {
+  const char* start = text.data();
+  const char* const end = start + text.size();
+  for (const char* at = start; at != end; ++at) {
+    const char* const escape = escapes[static_cast<unsigned char>(*at)];
+    if (escape != nullptr) {
+      Put(std::string_view(start, static_cast<std::size_t>(at - start)));
+      Put(escape);
+      start = at + 1;
     }
   }
-  Put(text.substr(start));
+  Put(std::string_view(start, static_cast<std::size_t>(end - start)));
 }
 
 void XmlTextSink::PutText(std::string_view text) {
-  PutEscaped(text, EscapeInText);
+  PutEscaped(text, kTextEscapes);
 }
 
 void XmlTextSink::PutAttributeValue(std::string_view value) {
-  PutEscaped(value, EscapeInAttribute);
+  PutEscaped(value, kAttributeEscapes);
 }
 
 void XmlTextSink::PutAttribute(std::string_view name, std::string_view value) {

@@ -11,7 +11,7 @@
 
 #include <array>
 #include <cstddef>
-#include <string>
+#include <cstring>
 #include <string_view>
 
 namespace Pelmar {
@@ -26,8 +26,24 @@ class XmlTextSink final {
   XmlTextSink& operator=(const XmlTextSink&) = delete;
 
   /// Markup and names: bytes that go out as they are.
-  void Put(std::string_view bytes);
-  void Put(char byte);
+  void Put(std::string_view bytes) {
+    // An empty view may have no address, which memcpy does not allow.
+    if (bytes.empty()) {
+      return;
+    }
+    if (bytes.size() > _buffer.size() - _used) {
+      PutBeyondBuffer(bytes);
+      return;
+    }
+    std::memcpy(_buffer.data() + _used, bytes.data(), bytes.size());
+    _used += bytes.size();
+  }
+  void Put(char byte) {
+    if (_used == _buffer.size()) {
+      Flush();
+    }
+    _buffer[_used++] = byte;
+  }
   /// Character data, escaped as Canonical XML 1.0, section 2.3, "Text Nodes" says.
   void PutText(std::string_view text);
   /// An attribute's value without its quotes, escaped as Canonical XML 1.0, section 2.3, "Attribute Nodes"
@@ -42,8 +58,9 @@ class XmlTextSink final {
   void Flush();
 
  private:
-  template <typename Escape>
-  void PutEscaped(std::string_view text, Escape escape);
+  void PutBeyondBuffer(std::string_view bytes);
+  template <typename Escapes>
+  void PutEscaped(std::string_view text, const Escapes& escapes);
 
   Writer* _writer;
   std::size_t _used = 0;

@@ -74,6 +74,9 @@ class PELMAR_API ParentNode : public Node {
   ~ParentNode() override;
 
  private:
+  friend class DocumentBuilder;
+
+  void LinkLast(Node* child) noexcept;
   void Unlink(Node* child) noexcept;
 
   Node* _firstChild;
