@@ -31,7 +31,6 @@ constexpr const char* kWstValidate = QUORLIN_WST_URI "/Validate";
 constexpr const char* kWstBearer = QUORLIN_WST_URI "/Bearer";
 constexpr const char* kWstPublicKey = QUORLIN_WST_URI "/PublicKey";
 constexpr const char* kWstStatusTokenType = QUORLIN_WST_URI "/RSTR/Status";
-constexpr const char* kWstStatusValid = QUORLIN_WST_URI "/status/valid";
 /// The SOAP actions of WS-Trust 1.3, sections 4 to 8.
 constexpr const char* kWstIssueAction = QUORLIN_WST_URI "/RST/Issue";
 constexpr const char* kWstRenewAction = QUORLIN_WST_URI "/RST/Renew";

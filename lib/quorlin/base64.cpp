@@ -169,7 +169,7 @@ bool Base64_ValidEncoding(const char* source, std::size_t sourceLength) {
 
 std::size_t Base64_EncodedLength(const void* /*source*/, std::size_t sourceLength) {
   std::size_t count = 0;
-  // A length that no buffer can have: whoever tries to allocate it is refused.
+  // A length that no buffer can have, where the text would be longer than any.
   return CountCharacters(sourceLength, count) ? count + 1 : kMaxLength;
 }
 
@@ -182,11 +182,14 @@ std::size_t Base64_DecodedLength(const char* source, std::size_t sourceLength) {
 }
 
 bool Base64_EasyEncode(const void* source, std::size_t sourceLength, char** result) {
-  const std::size_t size = Base64_EncodedLength(source, sourceLength);
-  char* text = static_cast<char*>(std::malloc(size));
-  if (text == nullptr || !Base64_Encode(source, sourceLength, text, size, nullptr)) {
+  *result = nullptr;
+  std::size_t count = 0;
+  if (!CountCharacters(sourceLength, count)) {
+    return false;
+  }
+  char* text = static_cast<char*>(std::malloc(count + 1));
+  if (text == nullptr || !Base64_Encode(source, sourceLength, text, count + 1, nullptr)) {
     std::free(text);
-    *result = nullptr;
     return false;
   }
   *result = text;

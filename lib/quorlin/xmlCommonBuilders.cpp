@@ -60,7 +60,11 @@ void PreBuiltElementImpl::build(Ref<ElementNode>& result) const {
   result = _element;
 }
 
-XMLCompositeBuilder::XMLCompositeBuilder(XMLBuilderPtr rootBuilder) : _rootBuilder(std::move(rootBuilder)) {
+XMLCompositeBuilder::XMLCompositeBuilder(XMLBuilderPtr rootBuilder)
+    : XMLCompositeBuilder(std::move(rootBuilder), std::vector<XMLBuilderPtr>()) {}
+
+XMLCompositeBuilder::XMLCompositeBuilder(XMLBuilderPtr rootBuilder, std::vector<XMLBuilderPtr> childBuilders)
+    : _rootBuilder(std::move(rootBuilder)), _childBuilders(std::move(childBuilders)) {
   Pelmar::Verify(_rootBuilder.get() != nullptr, "rootBuilder != __null", kSource);
 }
 
@@ -78,33 +82,28 @@ void XMLCompositeBuilder::build(Ref<ElementNode>& result) const {
 
 // --- Factories ---
 
-XMLBuilderPtr ElementBuilder(const std::string& prefix, const std::string& localName) {
-  return ElementBuilder(prefix, localName, AttributeMap());
+XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName) {
+  return ElementBuilder(std::move(prefix), std::move(localName), AttributeMap());
 }
 
-XMLBuilderPtr ElementBuilder(const std::string& prefix, const std::string& localName,
-                             const AttributeMap& attributes) {
-  return boost::make_shared<ElementBuilderImpl>(prefix, localName, attributes);
+XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName, AttributeMap attributes) {
+  return boost::make_shared<ElementBuilderImpl>(std::move(prefix), std::move(localName),
+                                                std::move(attributes));
 }
 
-XMLBuilderPtr TextElementBuilder(const std::string& prefix, const std::string& localName,
-                                 const std::string& text) {
-  return TextElementBuilder(prefix, localName, AttributeMap(), text);
+XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, std::string text) {
+  return TextElementBuilder(std::move(prefix), std::move(localName), AttributeMap(), std::move(text));
 }
 
-XMLBuilderPtr TextElementBuilder(const std::string& prefix, const std::string& localName,
-                                 const AttributeMap& attributes, const std::string& text) {
-  return boost::make_shared<TextElementBuilderImpl>(prefix, localName, attributes, text);
+XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, AttributeMap attributes,
+                                 std::string text) {
+  return boost::make_shared<TextElementBuilderImpl>(std::move(prefix), std::move(localName),
+                                                    std::move(attributes), std::move(text));
 }
 
 XMLBuilderPtr CompositeBuilder(const XMLBuilderPtr& rootBuilder,
                                std::initializer_list<XMLBuilderPtr> childBuilders) {
-  const boost::shared_ptr<XMLCompositeBuilder> composite =
-      boost::make_shared<XMLCompositeBuilder>(rootBuilder);
-  for (const XMLBuilderPtr& childBuilder : childBuilders) {
-    composite->Add(childBuilder);
-  }
-  return composite;
+  return boost::make_shared<XMLCompositeBuilder>(rootBuilder, std::vector<XMLBuilderPtr>(childBuilders));
 }
 
 XMLBuilderPtr InsertSamlTokenBuilder(const SamlToken& token) {

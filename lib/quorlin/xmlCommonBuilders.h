@@ -85,6 +85,7 @@ class XMLCompositeBuilder final : public XMLBaseBuilder {
  public:
   /// A null root is a programming error and aborts the process.
   explicit XMLCompositeBuilder(XMLBuilderPtr rootBuilder);
+  XMLCompositeBuilder(XMLBuilderPtr rootBuilder, std::vector<XMLBuilderPtr> childBuilders);
 
   XMLCompositeBuilder& Add(const XMLBuilderPtr& childBuilder);
   void build(Pelmar::Ref<Pelmar::Xml::ElementNode>& result) const override;
@@ -94,13 +95,11 @@ class XMLCompositeBuilder final : public XMLBaseBuilder {
   std::vector<XMLBuilderPtr> _childBuilders;
 };
 
-XMLBuilderPtr ElementBuilder(const std::string& prefix, const std::string& localName);
-XMLBuilderPtr ElementBuilder(const std::string& prefix, const std::string& localName,
-                             const AttributeMap& attributes);
-XMLBuilderPtr TextElementBuilder(const std::string& prefix, const std::string& localName,
-                                 const std::string& text);
-XMLBuilderPtr TextElementBuilder(const std::string& prefix, const std::string& localName,
-                                 const AttributeMap& attributes, const std::string& text);
+XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName);
+XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName, AttributeMap attributes);
+XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, std::string text);
+XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, AttributeMap attributes,
+                                 std::string text);
 
 /// A composite of `rootBuilder` and `childBuilders`.
 XMLBuilderPtr CompositeBuilder(const XMLBuilderPtr& rootBuilder,

@@ -54,7 +54,7 @@ struct Advice {
 class QUORLIN_API SamlToken {
  public:
   /// How the bearer proves to be the subject (SAML 2.0 Profiles, section 3).
-  enum ConfirmationType {
+  enum ConfirmationType : int {
     CONFIRM_BEARER = 0,        ///< urn:oasis:names:tc:SAML:2.0:cm:bearer: whoever has the token.
     CONFIRM_HOLDER_OF_KEY = 1  ///< urn:oasis:names:tc:SAML:2.0:cm:holder-of-key: who has the confirmation certificate's key.
   };

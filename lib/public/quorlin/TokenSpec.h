@@ -20,7 +20,7 @@ namespace Quorlin {
 /// The properties of a token to be issued. A plain value; only the lifetime must be set. The service may grant less than was asked.
 struct QUORLIN_API TokenSpec {
   /// How the token is to be bound to its bearer.
-  enum Confirmation {
+  enum Confirmation : int {
     CONFIRMATION_DEFAULT = 0,  ///< Holder-of-key when the service object has a HolderOfKeyConfig, bearer otherwise.
     CONFIRMATION_BEARER = 1    ///< Always bearer.
   };
@@ -35,7 +35,9 @@ struct QUORLIN_API TokenSpec {
   std::set<std::string> audienceRestriction;  ///< URIs of the services the token is for; empty: any.
   std::vector<Advice> advice;                ///< Advice for the service to write into the token.
   bool delegable;                            ///< Whether the token may be used to delegate the subject's identity.
-  boost::optional<std::string> delegateTo;   ///< The principal to delegate to. When set, requests by password or GSS go out unsigned.
+  /// The principal to delegate to. When set, requests by password or GSS go out unsigned, though they may ask for a
+  /// holder-of-key token.
+  boost::optional<std::string> delegateTo;
   bool renewable;                            ///< Whether the token may be renewed.
   Confirmation confirmation;
 };
