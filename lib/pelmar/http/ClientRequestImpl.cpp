@@ -17,12 +17,21 @@ namespace Http {
 
 namespace {
 
-// They say where a message ends, what becomes of the connection or how the body is coded, which the client decides; a second
-// opinion on any of them is how requests are smuggled.
+// They say where a message ends, what becomes of the connection or how the body is coded, which the client
+// decides; a second opinion on any of them is how requests are smuggled.
 const char* const kReservedHeaders[] = {
-    "accept-encoding", "connection", "content-length",    "cookie",  "expect",
-    "host",            "keep-alive", "proxy-connection", "te",      "trailer",
-    "transfer-encoding", "upgrade",
+    "accept-encoding",
+    "connection",
+    "content-length",
+    "cookie",
+    "expect",
+    "host",
+    "keep-alive",
+    "proxy-connection",
+    "te",
+    "trailer",
+    "transfer-encoding",
+    "upgrade",
 };
 
 // RFC 9110, section 5.6.2.
@@ -50,7 +59,8 @@ void RequireHeaderName(const std::string& name) {
 // Values may be secret and are not repeated.
 void RequireHeaderValue(const std::string& name, const std::string& value) {
   if (!std::all_of(value.begin(), value.end(), IsVisibleOrBlank)) {
-    throw InvalidArgumentException("the value of the header " + name + " has a control character or is not ASCII");
+    throw InvalidArgumentException("the value of the header " + name +
+                                   " has a control character or is not ASCII");
   }
 }
 

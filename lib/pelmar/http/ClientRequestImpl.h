@@ -30,7 +30,8 @@ class ClientRequestImpl final : public ClientRequest {
   void SetHeader(const std::string& name, const std::string& value) override;
   Writer* GetBodyWriter() override;
 
-  /// Gives the parts away. Throws InvalidStateException when that has been done, InvalidArgumentException for a GET with a body.
+  /// Gives the parts away. Throws InvalidStateException when that has been done, InvalidArgumentException for
+  /// a GET with a body.
   RequestParts TakeParts();
 
  private:

@@ -35,7 +35,8 @@ ConnectionSpec::~ConnectionSpec() = default;
 ConnectionSpecImpl::ConnectionSpecImpl(const std::string& host, int port)
     : _host(host), _port(port), _serverName(host), _id(DrawId()) {}
 
-ConnectionSpecImpl::ConnectionSpecImpl(const ConnectionSpecImpl& tcp, const Ref<const Ssl::SSLContextImpl>& context,
+ConnectionSpecImpl::ConnectionSpecImpl(const ConnectionSpecImpl& tcp,
+                                       const Ref<const Ssl::SSLContextImpl>& context,
                                        const std::string& tlsHost, const std::string& pins)
     : _host(tcp._host),
       _port(tcp._port),
@@ -68,8 +69,9 @@ Ref<ConnectionSpec> CreateTCPConnectionSpec(const std::string& host, int port) {
   return MakeRef<ConnectionSpecImpl>(host, port);
 }
 
-Ref<ConnectionSpec> CreateSSLConnectionSpec(const Ref<ConnectionSpec>& tcp, const Ref<Ssl::SSLContext>& context,
-                                            const std::string& host, const std::string& connectionParam) {
+Ref<ConnectionSpec> CreateSSLConnectionSpec(const Ref<ConnectionSpec>& tcp,
+                                            const Ref<Ssl::SSLContext>& context, const std::string& host,
+                                            const std::string& connectionParam) {
   const Ref<const ConnectionSpecImpl> base = ToConnectionSpecImpl(tcp.Get());
   if (base->IsTls()) {
     throw InvalidArgumentException("the connection spec uses TLS already");
@@ -80,7 +82,8 @@ Ref<ConnectionSpec> CreateSSLConnectionSpec(const Ref<ConnectionSpec>& tcp, cons
   }
   RequireHost(host);
   RequirePublicKeyPins(connectionParam);
-  return MakeRef<ConnectionSpecImpl>(*base, Ref<const Ssl::SSLContextImpl>(ownContext), host, connectionParam);
+  return MakeRef<ConnectionSpecImpl>(*base, Ref<const Ssl::SSLContextImpl>(ownContext), host,
+                                     connectionParam);
 }
 
 }  // namespace Http

@@ -19,8 +19,8 @@ namespace Http {
 class ConnectionSpecImpl final : public ConnectionSpec {
  public:
   ConnectionSpecImpl(const std::string& host, int port);
-  ConnectionSpecImpl(const ConnectionSpecImpl& tcp, const Ref<const Ssl::SSLContextImpl>& context, const std::string& tlsHost,
-                     const std::string& pins);
+  ConnectionSpecImpl(const ConnectionSpecImpl& tcp, const Ref<const Ssl::SSLContextImpl>& context,
+                     const std::string& tlsHost, const std::string& pins);
 
   bool IsTls() const { return static_cast<bool>(_context); }
   /// Where the TCP connection goes.

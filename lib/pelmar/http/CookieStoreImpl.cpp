@@ -45,13 +45,14 @@ std::string GetDomain(const std::string& line) {
 
 /// Two cookies of the same name, domain and path are the same cookie (RFC 6265, section 5.3, step 11).
 bool IsSameCookie(const std::string& a, const std::string& b) {
-  return GetField(a, kNameField) == GetField(b, kNameField) && GetField(a, kPathField) == GetField(b, kPathField) &&
-         GetDomain(a) == GetDomain(b);
+  return GetField(a, kNameField) == GetField(b, kNameField) &&
+         GetField(a, kPathField) == GetField(b, kPathField) && GetDomain(a) == GetDomain(b);
 }
 
 /// A new value leaves a cookie as old as it was (RFC 6265, section 5.3, step 11.3).
 void Put(Lines& lines, const std::string& line) {
-  const auto same = std::find_if(lines.begin(), lines.end(), [&](const std::string& other) { return IsSameCookie(line, other); });
+  const auto same = std::find_if(lines.begin(), lines.end(),
+                                 [&](const std::string& other) { return IsSameCookie(line, other); });
   if (same == lines.end()) {
     lines.push_back(line);
   } else {
@@ -61,7 +62,8 @@ void Put(Lines& lines, const std::string& line) {
 
 /// Whether it is among them, perhaps with another value.
 bool HasCookie(const Lines& lines, const std::string& line) {
-  return std::any_of(lines.begin(), lines.end(), [&](const std::string& other) { return IsSameCookie(line, other); });
+  return std::any_of(lines.begin(), lines.end(),
+                     [&](const std::string& other) { return IsSameCookie(line, other); });
 }
 
 }  // namespace
@@ -71,7 +73,9 @@ CookieStore::~CookieStore() = default;
 CookieStoreImpl::~CookieStoreImpl() = default;
 
 void CookieStoreImpl::Merge(const Lines& before, const Lines& after) {
-  const auto isRemoved = [&](const std::string& line) { return HasCookie(before, line) && !HasCookie(after, line); };
+  const auto isRemoved = [&](const std::string& line) {
+    return HasCookie(before, line) && !HasCookie(after, line);
+  };
   _lines.erase(std::remove_if(_lines.begin(), _lines.end(), isRemoved), _lines.end());
   for (const std::string& line : after) {
     if (!Contains(before, line)) {

@@ -41,19 +41,23 @@ std::string FormatSeconds(long long microseconds) {
 
 PendingRequestItem::~PendingRequestItem() = default;
 
-Ref<Exchange> Exchange::Create(const AgentParts& agent, RequestParts request, const CompletionFunctor& completion) {
-  const Ref<Exchange> exchange(new Exchange(agent, std::move(request)));
+Ref<Exchange> Exchange::Create(const AgentParts& agent, RequestParts request,
+                               const CompletionFunctor& completion) {
+  Ref<Exchange> exchange(new Exchange(agent, std::move(request)));
   exchange->_delivery.emplace_back([exchange, completion] { exchange->Complete(completion); });
   return exchange;
 }
 
-Exchange::Exchange(const AgentParts& agent, RequestParts&& request) : _agent(agent), _request(std::move(request)) {}
+Exchange::Exchange(const AgentParts& agent, RequestParts&& request)
+    : _agent(agent), _request(std::move(request)) {}
 
 Exchange::~Exchange() = default;
 
 bool Exchange::Wait(long long timeoutMicroseconds) {
   std::unique_lock<std::mutex> lock(_mutex);
-  const auto isSettled = [this] { return _settled; };
+  const auto isSettled = [this] {
+    return _settled;
+  };
   if (timeoutMicroseconds < 0) {
     _wake.wait(lock, isSettled);
     return true;
@@ -72,13 +76,15 @@ void Exchange::WaitOrGiveUp(long long timeoutMicroseconds) {
   if (Wait(timeout)) {
     return;
   }
-  const std::string text = "No answer from " + _agent.spec->GetEndpoint() + " within " + FormatSeconds(timeout) + " s";
+  const std::string text =
+      "No answer from " + _agent.spec->GetEndpoint() + " within " + FormatSeconds(timeout) + " s";
   if (Settle(std::make_shared<const HttpTimeoutException>(text), nullptr)) {
     HttpLoop::Get().Abandon(this);
   }
 }
 
-bool Exchange::Settle(const std::shared_ptr<const HttpException>& error, const Ref<ClientResponse>& response) {
+bool Exchange::Settle(const std::shared_ptr<const HttpException>& error,
+                      const Ref<ClientResponse>& response) {
   Work delivery;
   {
     const std::lock_guard<std::mutex> lock(_mutex);

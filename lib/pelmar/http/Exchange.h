@@ -34,17 +34,20 @@ struct AgentParts {
   Ref<CookieStoreImpl> cookies;
 };
 
-/// An exchange is settled once, by whoever comes first: the HTTP loop with the outcome, `Cancel`, or a waiter whose time is up. Settling
-/// wakes the waiters at once and sends the completion functor to the thread pool. What the loop still does for an exchange that
-/// was settled elsewhere (closing its connection) is nobody's concern any more.
+/// An exchange is settled once, by whoever comes first: the HTTP loop with the outcome, `Cancel`, or a waiter
+/// whose time is up. Settling wakes the waiters at once and sends the completion functor to the thread pool.
+/// What the loop still does for an exchange that was settled elsewhere (closing its connection) is nobody's
+/// concern any more.
 class Exchange final : public PendingRequestItem {
  public:
-  static Ref<Exchange> Create(const AgentParts& agent, RequestParts request, const CompletionFunctor& completion);
+  static Ref<Exchange> Create(const AgentParts& agent, RequestParts request,
+                              const CompletionFunctor& completion);
 
   bool Wait(long long timeoutMicroseconds) override;
   void Cancel() override;
 
-  /// Waits like `Wait`, but takes a negative time-out for none at all, and settles the exchange with HttpTimeoutException when it passes.
+  /// Waits like `Wait`, but takes a negative time-out for none at all, and settles the exchange with
+  /// HttpTimeoutException when it passes.
   void WaitOrGiveUp(long long timeoutMicroseconds);
 
   /// False when the exchange had been settled before. Exactly one of the two is given.

@@ -22,8 +22,8 @@ namespace {
 constexpr int kNoLimit = -1;
 constexpr int kRedeliverMilliseconds = 100;
 
-/// Blocks all signals on this thread, and so on the threads it starts meanwhile: the host's signal handlers are not to run on ours,
-/// and a broken connection shall not raise SIGPIPE.
+/// Blocks all signals on this thread, and so on the threads it starts meanwhile: the host's signal handlers
+/// are not to run on ours, and a broken connection shall not raise SIGPIPE.
 class SignalBlock final {
  public:
   SignalBlock() {
@@ -53,7 +53,8 @@ class ShutdownAtExit final {
 }  // namespace
 
 HttpLoop& HttpLoop::Get() {
-  // The pool comes first, so that at exit it goes last: what waits for us on its threads is released by our end.
+  // The pool comes first, so that at exit it goes last: what waits for us on its threads is released by our
+  // end.
   static System::ThreadPool* const pool = System::GetThreadPool();
   static HttpLoop* const loop = new HttpLoop([](const boost::function<void()>& work) { pool->Queue(work); });
   static const ShutdownAtExit shutdownAtExit(loop);
@@ -74,7 +75,8 @@ void HttpLoop::Submit(const Ref<Exchange>& exchange) {
     }
   }
   if (!Post({Verb::SUBMIT, exchange, 0})) {
-    exchange->Settle(std::make_shared<const HttpException>("Request was cancelled: the process ends"), nullptr);
+    exchange->Settle(std::make_shared<const HttpException>("Request was cancelled: the process ends"),
+                     nullptr);
   }
 }
 
@@ -175,7 +177,8 @@ void HttpLoop::Run() {
     // Those that came too late to be started end like those that run.
     for (const Command& command : commands) {
       if (command.verb == Verb::SUBMIT) {
-        command.exchange->Settle(std::make_shared<const HttpException>("Request was cancelled: the process ends"), nullptr);
+        command.exchange->Settle(
+            std::make_shared<const HttpException>("Request was cancelled: the process ends"), nullptr);
       }
     }
   }

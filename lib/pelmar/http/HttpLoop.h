@@ -22,9 +22,9 @@
 namespace Pelmar {
 namespace Http {
 
-/// Starts with the first request. Every libcurl object lives on its thread; other threads leave commands in a queue. It runs no code
-/// of a caller: completion functors go to the thread pool. When the process exits, requests still pending end with an HttpException,
-/// and so do those sent later.
+/// Starts with the first request. Every libcurl object lives on its thread; other threads leave commands in a
+/// queue. It runs no code of a caller: completion functors go to the thread pool. When the process exits,
+/// requests still pending end with an HttpException, and so do those sent later.
 class HttpLoop final {
  public:
   /// Hands work to the thread pool; throws when the pool cannot take it now.
@@ -47,8 +47,8 @@ class HttpLoop final {
   void DropAgent(std::uint64_t agent) noexcept;
   void DropSpec(std::uint64_t spec) noexcept;
 
-  /// Queues work on the thread pool. If the pool cannot take it now, the loop tries again until it can. Work that comes after the
-  /// shutdown is destroyed.
+  /// Queues work on the thread pool. If the pool cannot take it now, the loop tries again until it can. Work
+  /// that comes after the shutdown is destroyed.
   void Deliver(Work work);
 
   /// Ends the thread. A second call does nothing.

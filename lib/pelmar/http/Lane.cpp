@@ -22,7 +22,8 @@ void SettleAsFailed(Exchange& exchange, const char* text) {
 
 }  // namespace
 
-Lane::Lane(Poller& poller, SocketOwners& owners) : _poller(poller), _owners(owners), _multi(curl_multi_init()) {
+Lane::Lane(Poller& poller, SocketOwners& owners)
+    : _poller(poller), _owners(owners), _multi(curl_multi_init()) {
   if (!_multi || curl_multi_setopt(_multi.get(), CURLMOPT_SOCKETFUNCTION, &Lane::OnWatch) != CURLM_OK ||
       curl_multi_setopt(_multi.get(), CURLMOPT_SOCKETDATA, this) != CURLM_OK ||
       curl_multi_setopt(_multi.get(), CURLMOPT_TIMERFUNCTION, &Lane::OnTimer) != CURLM_OK ||

@@ -25,7 +25,8 @@ class Lane;
 /// Which lane a watched socket belongs to.
 using SocketOwners = std::unordered_map<int, Lane*>;
 
-/// One libcurl multi handle: connections are reused within it and never outside. Lives on the HTTP loop's thread.
+/// One libcurl multi handle: connections are reused within it and never outside. Lives on the HTTP loop's
+/// thread.
 class Lane final {
  public:
   using Clock = std::chrono::steady_clock;

@@ -56,7 +56,8 @@ const std::vector<SocketEvent>& Poller::Wait(int timeoutMilliseconds) {
       continue;
     }
     const std::uint32_t what = events[i].events;
-    _events.push_back({events[i].data.fd, (what & (EPOLLIN | EPOLLHUP | EPOLLERR)) != 0, (what & (EPOLLOUT | EPOLLERR)) != 0});
+    _events.push_back({events[i].data.fd, (what & (EPOLLIN | EPOLLHUP | EPOLLERR)) != 0,
+                       (what & (EPOLLOUT | EPOLLERR)) != 0});
   }
   return _events;
 }

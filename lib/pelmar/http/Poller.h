@@ -29,7 +29,8 @@ class Poller final {
   bool Watch(int socket, bool forReading, bool forWriting);
   void Forget(int socket);
 
-  /// Blocks until something happened or `timeoutMilliseconds` passed (negative: no limit). The events are valid until the next call.
+  /// Blocks until something happened or `timeoutMilliseconds` passed (negative: no limit). The events are
+  /// valid until the next call.
   const std::vector<SocketEvent>& Wait(int timeoutMilliseconds);
 
   /// Makes `Wait` return, now or when it is called next. For any thread.

@@ -16,7 +16,8 @@ namespace {
 constexpr std::size_t kSha256Bytes = 32;
 const char kPrefix[] = "sha256//";
 
-// Decoding alone is not enough: the decoder passes over white space, and the pin is compared as text later on.
+// Decoding alone is not enough: the decoder passes over white space, and the pin is compared as text later
+// on.
 bool IsHashText(const std::string& text) {
   try {
     const std::vector<unsigned char> hash = StringUtil::Base64Decode(text);

@@ -23,7 +23,8 @@ bool IsDigit(char c) {
 std::string TrimBlanks(const std::string& text) {
   const char* const blanks = " \t\r\n";
   const std::size_t start = text.find_first_not_of(blanks);
-  return start == std::string::npos ? std::string() : text.substr(start, text.find_last_not_of(blanks) + 1 - start);
+  return start == std::string::npos ? std::string()
+                                    : text.substr(start, text.find_last_not_of(blanks) + 1 - start);
 }
 
 std::string RemoveLineEnd(std::string line) {
@@ -40,7 +41,8 @@ bool IsInterim(int statusCode) {
 }  // namespace
 
 std::string MaskControlCharacters(std::string text) {
-  std::replace_if(text.begin(), text.end(), [](char c) { return (c >= '\0' && c < ' ') || c == '\x7f'; }, '?');
+  std::replace_if(
+      text.begin(), text.end(), [](char c) { return (c >= '\0' && c < ' ') || c == '\x7f'; }, '?');
   return text;
 }
 
@@ -49,7 +51,8 @@ HeadFault ResponseHead::TakeLine(const char* line, std::size_t size) {
     return _fault;
   }
   _bytes += size;
-  _fault = _bytes > kMaxResponseHeaderBytes ? HeadFault::TOO_LARGE : Judge(RemoveLineEnd(std::string(line, size)));
+  _fault =
+      _bytes > kMaxResponseHeaderBytes ? HeadFault::TOO_LARGE : Judge(RemoveLineEnd(std::string(line, size)));
   return _fault;
 }
 

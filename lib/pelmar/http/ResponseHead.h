@@ -14,14 +14,14 @@ namespace Http {
 
 enum class HeadFault {
   NONE,
-  TOO_LARGE,          ///< More than kMaxResponseHeaderBytes, interim responses and trailers included.
-  NOT_HTTP_1,         ///< A status line of another protocol or version.
-  CONTENT_CODING,     ///< A Content-Encoding, though the request asked for none.
-  TRANSFER_CODING,    ///< A Transfer-Encoding other than chunked.
+  TOO_LARGE,        ///< More than kMaxResponseHeaderBytes, interim responses and trailers included.
+  NOT_HTTP_1,       ///< A status line of another protocol or version.
+  CONTENT_CODING,   ///< A Content-Encoding, though the request asked for none.
+  TRANSFER_CODING,  ///< A Transfer-Encoding other than chunked.
 };
 
-/// Follows the lines of interim responses, the final one and trailers. Splitting the stream into lines, body lengths and the
-/// connection's fate are the HTTP engine's; this decides what we do not want to see at all.
+/// Follows the lines of interim responses, the final one and trailers. Splitting the stream into lines, body
+/// lengths and the connection's fate are the HTTP engine's; this decides what we do not want to see at all.
 class ResponseHead final {
  public:
   /// Takes one line with its line end. What it finds stays found: later lines change nothing.

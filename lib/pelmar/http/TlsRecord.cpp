@@ -72,7 +72,8 @@ void RecordName(const GENERAL_NAME* name, TlsRecord& record) {
     record.hasMoreNames = true;
     return;
   }
-  record.names.push_back(name->type == GEN_DNS ? ReadString(name->d.dNSName) : ReadAddress(name->d.iPAddress));
+  record.names.push_back(name->type == GEN_DNS ? ReadString(name->d.dNSName)
+                                               : ReadAddress(name->d.iPAddress));
 }
 
 void RecordNames(const X509* certificate, TlsRecord& record) {
@@ -125,7 +126,8 @@ int GetHolderIndex() {
 }
 
 const RecordHolder& GetHolder(const SSL* connection) {
-  return *static_cast<const RecordHolder*>(SSL_CTX_get_ex_data(SSL_get_SSL_CTX(connection), GetHolderIndex()));
+  return *static_cast<const RecordHolder*>(
+      SSL_CTX_get_ex_data(SSL_get_SSL_CTX(connection), GetHolderIndex()));
 }
 
 TlsAlert ClassifyAlert(int code) {
@@ -168,7 +170,7 @@ void AttachRecord(SSL_CTX* tls, const RecordHolder& record) {
   if (SSL_CTX_set_ex_data(tls, GetHolderIndex(), holder.get()) != 1) {
     Crypto::ThrowOpenSslError("TLS cannot be set up");
   }
-  holder.release();
+  static_cast<void>(holder.release());  // The context's now.
   record->hasClientCertificate = SSL_CTX_get0_certificate(tls) != nullptr;
   SSL_CTX_set_cert_verify_callback(tls, VerifyAndRecord, record.get());
   SSL_CTX_set_cert_cb(tls, RecordCertificateRequest, record.get());
@@ -177,8 +179,8 @@ void AttachRecord(SSL_CTX* tls, const RecordHolder& record) {
 
 // --- Trust ---
 
-// The HTTP engine adds flags, defaults and a cache of its own to the context's general store. Kept apart from that, the
-// anchors stay what they are.
+// The HTTP engine adds flags, defaults and a cache of its own to the context's general store. Kept apart from
+// that, the anchors stay what they are.
 void SetAnchorsApart(SSL_CTX* tls) {
   X509_STORE* const unused = X509_STORE_new();
   if (unused == nullptr || SSL_CTX_set1_verify_cert_store(tls, SSL_CTX_get_cert_store(tls)) != 1) {
@@ -190,7 +192,8 @@ void SetAnchorsApart(SSL_CTX* tls) {
 
 void RequireServerName(SSL_CTX* tls, const std::string& serverName) {
   X509_VERIFY_PARAM* const parameters = SSL_CTX_get0_param(tls);
-  X509_VERIFY_PARAM_set_hostflags(parameters, X509_CHECK_FLAG_NEVER_CHECK_SUBJECT | X509_CHECK_FLAG_NO_PARTIAL_WILDCARDS);
+  X509_VERIFY_PARAM_set_hostflags(parameters,
+                                  X509_CHECK_FLAG_NEVER_CHECK_SUBJECT | X509_CHECK_FLAG_NO_PARTIAL_WILDCARDS);
   const int isSet = IsIPAddress(serverName)
                         ? X509_VERIFY_PARAM_set1_ip_asc(parameters, serverName.c_str())
                         : X509_VERIFY_PARAM_set1_host(parameters, serverName.data(), serverName.size());

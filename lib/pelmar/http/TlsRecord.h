@@ -25,28 +25,38 @@ namespace Http {
 /// A message lists at most this many of the names that a certificate is for.
 constexpr std::size_t kMaxNamesShown = 10;
 
-enum class CertificateProblem { NONE, UNKNOWN_ISSUER, SELF_SIGNED, EXPIRED, NOT_YET_VALID, WRONG_NAME, OTHER };
+enum class CertificateProblem {
+  NONE,
+  UNKNOWN_ISSUER,
+  SELF_SIGNED,
+  EXPIRED,
+  NOT_YET_VALID,
+  WRONG_NAME,
+  OTHER
+};
 
 enum class TlsAlert { NONE, PROTOCOL_VERSION, CERTIFICATE_REQUIRED, OTHER };
 
 /// Written by the connection as it goes along, on the HTTP loop's thread.
 struct TlsRecord {
   CertificateProblem problem = CertificateProblem::NONE;
-  bool isServerCertificate = false;  ///< Whether the problem lies with the server's own certificate or with one above it.
-  std::string subject;               ///< Names of the certificate the problem lies with, as RFC 4514 text.
+  bool isServerCertificate =
+      false;            ///< Whether the problem lies with the server's own certificate or with one above it.
+  std::string subject;  ///< Names of the certificate the problem lies with, as RFC 4514 text.
   std::string issuer;
-  std::string notBefore;             ///< Its validity as xs:dateTime.
+  std::string notBefore;  ///< Its validity as xs:dateTime.
   std::string notAfter;
-  std::vector<std::string> names;    ///< DNS names and IP addresses that the server's certificate is for; at most kMaxNamesShown.
+  std::vector<std::string>
+      names;  ///< DNS names and IP addresses that the server's certificate is for; at most kMaxNamesShown.
   bool hasMoreNames = false;
-  std::string reason;                ///< The verifier's words.
+  std::string reason;  ///< The verifier's words.
 
-  TlsAlert alert = TlsAlert::NONE;   ///< The last fatal alert that either side sent.
+  TlsAlert alert = TlsAlert::NONE;  ///< The last fatal alert that either side sent.
   std::string alertText;
   bool isAlertFromServer = false;
   bool wasClientCertificateRequested = false;
   bool hasClientCertificate = false;
-  bool hasServerEnded = false;       ///< The server has sent close_notify.
+  bool hasServerEnded = false;  ///< The server has sent close_notify.
 };
 
 /// Why OpenSSL gave up, as far as it matters here.
@@ -57,9 +67,10 @@ struct TlsFailureReason {
   std::string text;  ///< OpenSSL's words; empty when there is no reason.
 };
 
-/// Readies `tls` for one connection to `serverName` with the anchors and identity of `context`, and has the handshake tell `record`
-/// about itself. The record changes no verdict. On top of what the HTTP engine checks, the server's certificate must be for
-/// `serverName` by its subject alternative names; the common name does not count (RFC 9525, section 6.3). Throws CryptoException.
+/// Readies `tls` for one connection to `serverName` with the anchors and identity of `context`, and has the
+/// handshake tell `record` about itself. The record changes no verdict. On top of what the HTTP engine
+/// checks, the server's certificate must be for `serverName` by its subject alternative names; the common
+/// name does not count (RFC 9525, section 6.3). Throws CryptoException.
 void ConfigureTls(ssl_ctx_st* tls, const Ssl::SSLContextImpl& context, const std::string& serverName,
                   const std::shared_ptr<TlsRecord>& record);
 

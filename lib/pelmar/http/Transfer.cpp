@@ -23,13 +23,14 @@ constexpr long kOff = 0;
 /// The host name of the certificate is checked.
 constexpr long kVerifyHost = 2;
 
-// The list is given to the owner only when the new line is in it; on failure the engine leaves the list as it was.
+// The list is given to the owner only when the new line is in it; on failure the engine leaves the list as it
+// was.
 void Append(TextList& list, const std::string& line) {
   curl_slist* const longer = curl_slist_append(list.get(), line.c_str());
   if (longer == nullptr) {
     throw std::bad_alloc();
   }
-  list.release();
+  static_cast<void>(list.release());
   list.reset(longer);
 }
 
@@ -40,7 +41,8 @@ bool HasHeader(const RequestParts& request, const std::string& lowerName) {
 
 }  // namespace
 
-Transfer::Transfer(const Ref<Exchange>& exchange, CURLSH* share) : _exchange(exchange), _easy(curl_easy_init()) {
+Transfer::Transfer(const Ref<Exchange>& exchange, CURLSH* share)
+    : _exchange(exchange), _easy(curl_easy_init()) {
   if (!_easy) {
     throw HttpException("The HTTP engine cannot be set up");
   }
@@ -76,7 +78,8 @@ void Transfer::SetIsolation() {
   Set(CURLOPT_HTTP09_ALLOWED, kOff);
   Set(CURLOPT_CONNECTTIMEOUT, kMaxConnectSeconds);
   Set(CURLOPT_TCP_NODELAY, kOn);
-  Set(CURLOPT_TCP_KEEPALIVE, kOn);  // Nobody may be waiting with a time-out: a vanished peer shall be noticed.
+  Set(CURLOPT_TCP_KEEPALIVE,
+      kOn);  // Nobody may be waiting with a time-out: a vanished peer shall be noticed.
   // A cancelled exchange must not hold up the loop until its name look-up returns.
   Set(CURLOPT_QUICK_EXIT, kOn);
 }
@@ -155,7 +158,8 @@ void Transfer::SetReceivers() {
 void Transfer::SetCookies() {
   Set(CURLOPT_COOKIEFILE, "");  // Reads no file, but handles cookies.
   _cookiesBefore = _exchange->GetAgent().cookies->GetLines();
-  // The engine sends the one it was given last first; older cookies belong before newer ones (RFC 6265, section 5.4, step 2).
+  // The engine sends the one it was given last first; older cookies belong before newer ones (RFC 6265,
+  // section 5.4, step 2).
   for (auto line = _cookiesBefore.rbegin(); line != _cookiesBefore.rend(); ++line) {
     Set(CURLOPT_COOKIELIST, line->c_str());
   }
@@ -203,7 +207,8 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
 void Transfer::Finish(CURLcode code) {
   SaveCookies();
   if (HasSucceeded(code)) {
-    _exchange->Settle(nullptr, MakeRef<ClientResponseImpl>(_head.GetStatusCode(), _head.GetReason(), std::move(_body)));
+    _exchange->Settle(
+        nullptr, MakeRef<ClientResponseImpl>(_head.GetStatusCode(), _head.GetReason(), std::move(_body)));
   } else {
     _exchange->Settle(DescribeFailure(code), nullptr);
   }
@@ -235,7 +240,8 @@ bool Transfer::HasSucceeded(CURLcode code) const {
   if (code != CURLE_OK || !_head.IsComplete() || _head.GetFault() != HeadFault::NONE) {
     return false;
   }
-  // Anyone on the way can end the TCP connection, so with TLS only close_notify shows that the body is whole (RFC 9112, section 9.8).
+  // Anyone on the way can end the TCP connection, so with TLS only close_notify shows that the body is whole
+  // (RFC 9112, section 9.8).
   return !_tls || !_head.IsEndedByConnection() || (_connectionTls && _connectionTls->hasServerEnded);
 }
 

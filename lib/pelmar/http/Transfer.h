@@ -22,7 +22,8 @@ namespace Http {
 /// Lives on the HTTP loop's thread.
 class Transfer final {
  public:
-  /// `share` keeps the TLS sessions and addresses of the spec. Throws HttpException when the engine refuses a setting.
+  /// `share` keeps the TLS sessions and addresses of the spec. Throws HttpException when the engine refuses a
+  /// setting.
   Transfer(const Ref<Exchange>& exchange, CURLSH* share);
   Transfer(const Transfer&) = delete;
   Transfer& operator=(const Transfer&) = delete;

@@ -37,7 +37,9 @@ std::string ListNames(const TlsRecord& tls) {
 /// The start of a sentence about the certificate with the problem.
 std::string NameCertificate(const TransferFacts& facts) {
   const std::string server = "ertificate of " + facts.serverName;
-  return facts.tls->isServerCertificate ? "C" + server : "Issuing certificate " + facts.tls->subject + " above the c" + server;
+  return facts.tls->isServerCertificate
+             ? "C" + server
+             : "Issuing certificate " + facts.tls->subject + " above the c" + server;
 }
 
 std::string DescribeCertificateProblem(const TransferFacts& facts) {
@@ -73,7 +75,8 @@ std::string DescribeAlert(const TransferFacts& facts) {
   if (tls.wasClientCertificateRequested && !tls.hasClientCertificate) {
     return facts.endpoint + " demands a client certificate";
   }
-  return facts.endpoint + (tls.wasClientCertificateRequested ? " refused the client certificate: " : " ended TLS: ") +
+  return facts.endpoint +
+         (tls.wasClientCertificateRequested ? " refused the client certificate: " : " ended TLS: ") +
          tls.alertText;
 }
 
@@ -86,7 +89,8 @@ std::string DescribeEnd(const TransferFacts& facts, const std::string& what) {
   if (facts.head.HasStarted()) {
     return facts.endpoint + " " + what + " inside the headers of its answer";
   }
-  const bool wantsCertificate = facts.tls && facts.tls->wasClientCertificateRequested && !facts.tls->hasClientCertificate;
+  const bool wantsCertificate =
+      facts.tls && facts.tls->wasClientCertificateRequested && !facts.tls->hasClientCertificate;
   return facts.endpoint + " " + what + " before it answered" +
          (wantsCertificate ? "; it had asked for a client certificate" : "");
 }
@@ -120,7 +124,7 @@ std::string DescribeBrokenConnection(const TransferFacts& facts) {
   if (IsReset(facts.systemError)) {
     return DescribeEnd(facts, "reset the connection");
   }
-  const std::string tlsFailure = DescribeTlsFailure(facts);
+  std::string tlsFailure = DescribeTlsFailure(facts);
   if (!tlsFailure.empty()) {
     return tlsFailure;
   }
@@ -134,11 +138,12 @@ std::string DescribeHandshakeFailure(const TransferFacts& facts) {
   if (facts.tls && facts.tls->problem != CertificateProblem::NONE) {
     return DescribeCertificateProblem(facts);
   }
-  const std::string tlsFailure = DescribeTlsFailure(facts);
+  std::string tlsFailure = DescribeTlsFailure(facts);
   if (!tlsFailure.empty() && FindTlsFailureReason(facts.engineText).kind != TlsFailureKind::UNEXPECTED_END) {
     return tlsFailure;
   }
-  return facts.endpoint + (IsReset(facts.systemError) ? " reset" : " closed") + " the connection during the TLS handshake";
+  return facts.endpoint + (IsReset(facts.systemError) ? " reset" : " closed") +
+         " the connection during the TLS handshake";
 }
 
 std::string DescribeConnectFailure(const TransferFacts& facts) {
@@ -181,7 +186,7 @@ bool IsChunkingFault(const TransferFacts& facts) {
 }
 
 std::string Describe(const TransferFacts& facts) {
-  const std::string refusal = DescribeRefusal(facts);
+  std::string refusal = DescribeRefusal(facts);
   if (!refusal.empty()) {
     return refusal;
   }
@@ -207,8 +212,8 @@ std::string Describe(const TransferFacts& facts) {
     case CURLE_WEIRD_SERVER_REPLY:
       return facts.endpoint + " did not answer in HTTP/1";
     case CURLE_FILESIZE_EXCEEDED:
-      return "The body of the answer of " + facts.endpoint + " has more than " + std::to_string(kMaxResponseBytes) +
-             " bytes";
+      return "The body of the answer of " + facts.endpoint + " has more than " +
+             std::to_string(kMaxResponseBytes) + " bytes";
     case CURLE_OUT_OF_MEMORY:
       // The engine's word for a line beyond its own bound.
       return facts.head.IsComplete() ? DescribeUnknown(facts)
@@ -218,7 +223,8 @@ std::string Describe(const TransferFacts& facts) {
       return DescribeEnd(facts, "closed the connection");
     case CURLE_SEND_ERROR:
     case CURLE_RECV_ERROR:
-      return IsChunkingFault(facts) ? facts.endpoint + " answered in broken chunks" : DescribeBrokenConnection(facts);
+      return IsChunkingFault(facts) ? facts.endpoint + " answered in broken chunks"
+                                    : DescribeBrokenConnection(facts);
     default:
       return DescribeUnknown(facts);
   }

@@ -19,7 +19,8 @@
 namespace Pelmar {
 namespace Http {
 
-/// How long the TCP connection and the TLS handshake may take together when nobody waits with a shorter time-out.
+/// How long the TCP connection and the TLS handshake may take together when nobody waits with a shorter
+/// time-out.
 constexpr long kMaxConnectSeconds = 300;
 
 struct TransferFacts {

@@ -50,7 +50,7 @@ bool TakeScheme(std::string& rest) {
 /// Takes everything up to the path or query off `rest`.
 std::string TakeAuthority(std::string& rest) {
   const std::size_t end = rest.find_first_of("/?");
-  const std::string authority = rest.substr(0, end);
+  std::string authority = rest.substr(0, end);
   rest.erase(0, authority.size());
   return authority;
 }
@@ -58,13 +58,13 @@ std::string TakeAuthority(std::string& rest) {
 /// Takes the host off `authority`, so that nothing or a port with its colon is left.
 std::string TakeHost(std::string& authority) {
   if (authority[0] != '[') {
-    const std::string host = authority.substr(0, authority.find(':'));
+    std::string host = authority.substr(0, authority.find(':'));
     authority.erase(0, host.size());
     return host;
   }
   const std::size_t end = authority.find(']');
   RefuseIf(end == std::string::npos, "the host has no closing bracket");
-  const std::string host = authority.substr(1, end - 1);
+  std::string host = authority.substr(1, end - 1);
   RefuseIf(!IsIPv6Address(host), "the host is not an IPv6 address");
   authority.erase(0, end + 1);
   RefuseIf(!authority.empty() && authority[0] != ':', "something stands between the host and the port");
@@ -86,7 +86,7 @@ int ReadPort(const std::string& text, int defaultPort) {
 }
 
 std::string ReadPath(const std::string& rest) {
-  const std::string path = !rest.empty() && rest[0] == '/' ? rest : "/" + rest;
+  std::string path = !rest.empty() && rest[0] == '/' ? rest : "/" + rest;
   const std::string fault = FindPathFault(path);
   if (!fault.empty()) {
     Refuse(fault);

@@ -51,8 +51,8 @@ std::string FindLabelFault(const std::string& label) {
   return std::string();
 }
 
-// "127.1", "0x7f.0.0.1" and "017700000001" mean an address to some resolvers and a name to others, so that what is
-// checked and what is connected to could differ.
+// "127.1", "0x7f.0.0.1" and "017700000001" mean an address to some resolvers and a name to others, so that
+// what is checked and what is connected to could differ.
 bool EndsInNumber(const std::string& host) {
   const std::string last = host.substr(host.rfind('.') + 1);
   return IsDigit(last[0]) && (last.find_first_not_of("0123456789") == std::string::npos ||
@@ -63,7 +63,7 @@ std::string FindNameFault(const std::string& host) {
   std::size_t start = 0;
   for (;;) {
     const std::size_t end = host.find('.', start);
-    const std::string fault = FindLabelFault(host.substr(start, end == std::string::npos ? end : end - start));
+    std::string fault = FindLabelFault(host.substr(start, end == std::string::npos ? end : end - start));
     if (!fault.empty()) {
       return fault;
     }

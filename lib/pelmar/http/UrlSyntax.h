@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// The pieces of an HTTP URL (RFC 3986, section 3): what is acceptable in each. Every check names the first thing that is wrong, in words that
-// repeat nothing of the text.
+// The pieces of an HTTP URL (RFC 3986, section 3): what is acceptable in each. Every check names the first
+// thing that is wrong, in words that repeat nothing of the text.
 
 #ifndef PELMAR_HTTP_URLSYNTAX_H
 #define PELMAR_HTTP_URLSYNTAX_H
@@ -25,10 +25,12 @@ bool IsIPv6Address(const std::string& host);
 /// Whether `host` is an IP address of either kind.
 bool IsIPAddress(const std::string& host);
 
-/// What is wrong with a host (a name, an IPv4 address, or an IPv6 address without its brackets); empty when nothing is.
+/// What is wrong with a host (a name, an IPv4 address, or an IPv6 address without its brackets); empty when
+/// nothing is.
 std::string FindHostFault(const std::string& host);
 
-/// What is wrong with a request target in origin form (RFC 9112, section 3.2.1): path and query. Empty when nothing is.
+/// What is wrong with a request target in origin form (RFC 9112, section 3.2.1): path and query. Empty when
+/// nothing is.
 std::string FindPathFault(const std::string& path);
 
 /// "host:port", with brackets around an IPv6 address.

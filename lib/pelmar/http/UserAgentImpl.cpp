@@ -45,7 +45,7 @@ void UserAgentImpl::SendAsync(const Ref<ClientRequest>& request, const Completio
   item = exchange;
   try {
     HttpLoop::Get().Submit(exchange);
-  } catch (const Exception&) {
+  } catch (...) {
     // Never started, so nobody is to be told but the caller.
     exchange->Disarm();
     item = nullptr;

@@ -19,7 +19,8 @@ class UserAgentImpl final : public UserAgent {
 
   void SendAsync(const Ref<ClientRequest>& request, const CompletionFunctor& completion,
                  Ref<PendingRequestItem>& item) override;
-  void WaitFor(const Ref<PendingRequestItem>& item, long long timeoutMicroseconds, Ref<ClientResponse>& response) override;
+  void WaitFor(const Ref<PendingRequestItem>& item, long long timeoutMicroseconds,
+               Ref<ClientResponse>& response) override;
 
  private:
   ~UserAgentImpl() override;

@@ -21,8 +21,9 @@ struct HttpURL {
   std::string path;  ///< Path and query as written, percent escapes kept; "/" when the URL has none.
 };
 
-/// Splits `url` (RFC 3986; RFC 9110, section 4.2). The scheme is accepted in any letter case. User information, fragments, white space, control
-/// and non-ASCII characters, empty hosts and bad ports are refused with HttpException, whose message never holds user information.
+/// Splits `url` (RFC 3986; RFC 9110, section 4.2). The scheme is accepted in any letter case. User
+/// information, fragments, white space, control and non-ASCII characters, empty hosts and bad ports are
+/// refused with HttpException, whose message never holds user information.
 PELMAR_API HttpURL ParseHttpURL(const std::string& url);
 
 }  // namespace Http

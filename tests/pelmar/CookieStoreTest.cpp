@@ -1,0 +1,81 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "pelmar/http/CookieStoreImpl.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+namespace {
+
+using Pelmar::MakeRef;
+using Pelmar::Ref;
+using Pelmar::Http::CookieStoreImpl;
+using Pelmar::Http::kMaxCookies;
+
+using Lines = std::vector<std::string>;
+
+std::string MakeLine(const std::string& name, const std::string& value, const std::string& path = "/",
+                     const std::string& domain = "host") {
+  return domain + "\tFALSE\t" + path + "\tFALSE\t0\t" + name + "\t" + value;
+}
+
+TEST(CookieStore, TakesNewCookiesInOrder) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  store->Merge({}, {MakeLine("a", "1"), MakeLine("b", "2")});
+  EXPECT_EQ((Lines{MakeLine("a", "1"), MakeLine("b", "2")}), store->GetLines());
+}
+
+TEST(CookieStore, ReplacesInPlace) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  const Lines before = {MakeLine("a", "1"), MakeLine("b", "2")};
+  store->Merge({}, before);
+  store->Merge(before, {MakeLine("b", "2"), MakeLine("a", "3")});
+  EXPECT_EQ((Lines{MakeLine("a", "3"), MakeLine("b", "2")}), store->GetLines());
+}
+
+TEST(CookieStore, TakesNameDomainAndPathForTheCookie) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  const Lines all = {MakeLine("a", "1"), MakeLine("a", "2", "/x"), MakeLine("a", "3", "/", "other"),
+                     MakeLine("A", "4")};
+  store->Merge({}, all);
+  EXPECT_EQ(all, store->GetLines());
+}
+
+TEST(CookieStore, SeesTheSameDomainBehindMarks) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  const Lines before = {MakeLine("a", "1")};
+  store->Merge({}, before);
+  const Lines after = {MakeLine("a", "2", "/", "#HttpOnly_.host")};
+  store->Merge(before, after);
+  EXPECT_EQ(after, store->GetLines());
+}
+
+TEST(CookieStore, RemovesWhatTheExchangeRemoved) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  const Lines before = {MakeLine("a", "1"), MakeLine("b", "2")};
+  store->Merge({}, before);
+  store->Merge(before, {MakeLine("b", "2")});
+  EXPECT_EQ((Lines{MakeLine("b", "2")}), store->GetLines());
+}
+
+TEST(CookieStore, KeepsWhatAnotherExchangeBroughtMeanwhile) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  store->Merge({}, {MakeLine("a", "1")});
+  store->Merge({}, {MakeLine("b", "2")});
+  EXPECT_EQ((Lines{MakeLine("a", "1"), MakeLine("b", "2")}), store->GetLines());
+}
+
+TEST(CookieStore, ForgetsTheOldestBeyondTheBound) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  Lines lines;
+  for (std::size_t i = 0; i <= kMaxCookies; ++i) {
+    lines.push_back(MakeLine("c" + std::to_string(i), "v"));
+  }
+  store->Merge({}, lines);
+  EXPECT_EQ(Lines(lines.begin() + 1, lines.end()), store->GetLines());
+}
+
+}  // namespace

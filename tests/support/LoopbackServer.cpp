@@ -1,0 +1,400 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+#include "support/LoopbackServer.h"
+
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <netinet/tcp.h>
+#include <openssl/pem.h>
+#include <openssl/ssl.h>
+#include <pthread.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <cstdint>
+#include <cstdlib>
+#include <stdexcept>
+#include <utility>
+
+namespace TestSupport {
+
+namespace {
+
+/// Thrown to break a script off.
+struct Broken {};
+
+constexpr int kBacklog = 512;
+constexpr std::size_t kReadSize = 16384;
+
+void Require(bool condition, const char* what) {
+  if (!condition) {
+    throw std::runtime_error(what);
+  }
+}
+
+sockaddr_in MakeAddress(int port) {
+  sockaddr_in address = {};
+  address.sin_family = AF_INET;
+  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  address.sin_port = htons(static_cast<std::uint16_t>(port));
+  return address;
+}
+
+/// A socket on a free port; the port goes to `port`.
+int Bind(int& port) {
+  const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+  Require(socket >= 0, "no socket");
+  sockaddr_in address = MakeAddress(0);
+  socklen_t size = sizeof address;
+  Require(::bind(socket, reinterpret_cast<const sockaddr*>(&address), size) == 0, "cannot bind");
+  Require(::getsockname(socket, reinterpret_cast<sockaddr*>(&address), &size) == 0, "no socket name");
+  port = ntohs(address.sin_port);
+  return socket;
+}
+
+// OpenSSL writes without MSG_NOSIGNAL.
+void BlockSigpipe() {
+  sigset_t signals;
+  sigemptyset(&signals);
+  sigaddset(&signals, SIGPIPE);
+  pthread_sigmask(SIG_BLOCK, &signals, nullptr);
+}
+
+struct X509Deleter {
+  void operator()(X509* certificate) const noexcept { X509_free(certificate); }
+};
+using X509Owner = std::unique_ptr<X509, X509Deleter>;
+
+X509Owner ToX509(const Identity& identity) {
+  const std::vector<unsigned char>& der = identity.certificate->GetDer();
+  const unsigned char* data = der.data();
+  X509Owner certificate(d2i_X509(nullptr, &data, static_cast<long>(der.size())));
+  Require(certificate != nullptr, "bad certificate");
+  return certificate;
+}
+
+void DemandClientCertificate(SSL_CTX* context, const Identity& ca) {
+  Require(X509_STORE_add_cert(SSL_CTX_get_cert_store(context), ToX509(ca).get()) == 1, "bad client CA");
+  SSL_CTX_set_verify(context, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);
+}
+
+SSL_CTX* MakeTlsContext(const TlsServerSettings& settings) {
+  SSL_CTX* const context = SSL_CTX_new(TLS_server_method());
+  Require(context != nullptr, "no TLS context");
+  const std::string sessionContext = "test";
+  SSL_CTX_set_session_id_context(context, reinterpret_cast<const unsigned char*>(sessionContext.data()),
+                                 static_cast<unsigned>(sessionContext.size()));
+  // Old protocol versions need SHA-1.
+  SSL_CTX_set_security_level(context, settings.maxVersion == 0 ? 2 : 0);
+  SSL_CTX_set_min_proto_version(context, 0);
+  SSL_CTX_set_max_proto_version(context, settings.maxVersion);
+  Require(SSL_CTX_use_certificate(context, ToX509(settings.identity).get()) == 1, "bad server certificate");
+  Require(SSL_CTX_use_PrivateKey(context, settings.identity.keyPair.GetHandle()) == 1, "bad server key");
+  for (const Identity& issuer : settings.chain) {
+    Require(SSL_CTX_add1_chain_cert(context, ToX509(issuer).get()) == 1, "bad chain");
+  }
+  SSL_CTX_set_mode(context, SSL_MODE_NO_AUTO_CHAIN);
+  if (settings.clientCa) {
+    DemandClientCertificate(context, *settings.clientCa);
+  }
+  return context;
+}
+
+/// How many bytes of body the head announces.
+std::size_t ReadContentLength(const std::string& head) {
+  const std::string name = "Content-Length: ";
+  const std::size_t start = head.find(name);
+  return start == std::string::npos ? 0 : std::strtoul(head.c_str() + start + name.size(), nullptr, 10);
+}
+
+}  // namespace
+
+// --- ServerConnection ---
+
+void ServerConnection::TlsDeleter::operator()(SSL* tls) const noexcept {
+  SSL_free(tls);
+}
+
+ServerConnection::ServerConnection(LoopbackServer& server, std::size_t index, int socket)
+    : _server(server), _index(index), _socket(socket) {}
+
+ServerConnection::~ServerConnection() {
+  const std::lock_guard<std::mutex> lock(_server._mutex);
+  _server._sockets[_index] = -1;
+  if (_socket >= 0) {
+    ::close(_socket);
+  }
+}
+
+void ServerConnection::StartTls() {
+  _tls.reset(SSL_new(_server._tlsContext.get()));
+  Require(_tls != nullptr, "no TLS");
+  SSL_set_fd(_tls.get(), _socket);
+  const bool isSecured = SSL_accept(_tls.get()) == 1;
+  const char* const name = SSL_get_servername(_tls.get(), TLSEXT_NAMETYPE_host_name);
+  _server.Change(_index, [&](ConnectionRecord& record) {
+    record.isSecured = isSecured;
+    record.wasResumed = isSecured && SSL_session_reused(_tls.get()) == 1;
+    record.serverNameAsked = name == nullptr ? "" : name;
+  });
+  if (!isSecured) {
+    // Read on, for closing over unread bytes would reset the connection and could take the alert with it.
+    _tls.reset();
+    CloseWithoutNotice();
+    throw Broken();
+  }
+}
+
+std::string ServerConnection::Receive() {
+  char buffer[kReadSize];
+  const long count =
+      _tls ? SSL_read(_tls.get(), buffer, sizeof buffer) : ::recv(_socket, buffer, sizeof buffer, 0);
+  if (count <= 0) {
+    throw Broken();
+  }
+  std::string bytes(buffer, static_cast<std::size_t>(count));
+  _server.Change(_index, [&](ConnectionRecord& record) { record.received += bytes; });
+  return bytes;
+}
+
+void ServerConnection::ReadSome() {
+  Receive();
+}
+
+void ServerConnection::ReadRequest() {
+  const std::string headEnd = "\r\n\r\n";
+  while (_unread.find(headEnd) == std::string::npos) {
+    _unread += Receive();
+  }
+  const std::size_t headSize = _unread.find(headEnd) + headEnd.size();
+  const std::size_t size = headSize + ReadContentLength(_unread.substr(0, headSize));
+  while (_unread.size() < size) {
+    _unread += Receive();
+  }
+  _unread.erase(0, size);
+  _server.Change(_index, [](ConnectionRecord& record) { ++record.requests; });
+}
+
+void ServerConnection::Write(const char* data, std::size_t size) {
+  const long count =
+      _tls ? SSL_write(_tls.get(), data, static_cast<int>(size)) : ::send(_socket, data, size, MSG_NOSIGNAL);
+  if (count != static_cast<long>(size)) {
+    throw Broken();
+  }
+}
+
+void ServerConnection::Send(const std::string& bytes) {
+  if (!bytes.empty()) {
+    Write(bytes.data(), bytes.size());
+  }
+}
+
+void ServerConnection::SendForever(const std::string& bytes) {
+  for (;;) {
+    Send(bytes);
+  }
+}
+
+void ServerConnection::AwaitRelease() {
+  std::unique_lock<std::mutex> lock(_server._mutex);
+  _server._changed.wait(lock, [&] { return _server._isReleased || _server._isStopping; });
+  if (_server._isStopping) {
+    throw Broken();
+  }
+}
+
+void ServerConnection::AwaitPeerEnd() {
+  try {
+    for (;;) {
+      Receive();
+    }
+  } catch (const Broken&) {
+    // That is what was waited for.
+  }
+}
+
+void ServerConnection::Close() {
+  if (_tls) {
+    SSL_shutdown(_tls.get());
+  }
+  CloseWithoutNotice();
+}
+
+void ServerConnection::CloseWithoutNotice() {
+  ::shutdown(_socket, SHUT_WR);
+  char buffer[kReadSize];
+  while (::recv(_socket, buffer, sizeof buffer, 0) > 0) {
+  }
+}
+
+void ServerConnection::Reset() {
+  const linger hard = {1, 0};
+  ::setsockopt(_socket, SOL_SOCKET, SO_LINGER, &hard, sizeof hard);
+  _tls.reset();
+  const std::lock_guard<std::mutex> lock(_server._mutex);
+  _server._sockets[_index] = -1;
+  ::close(_socket);
+  _socket = -1;
+}
+
+// --- LoopbackServer ---
+
+void LoopbackServer::TlsContextDeleter::operator()(SSL_CTX* context) const noexcept {
+  SSL_CTX_free(context);
+}
+
+LoopbackServer::LoopbackServer(std::vector<Script> scripts) : _scripts(std::move(scripts)) {
+  Listen();
+}
+
+LoopbackServer::LoopbackServer(const TlsServerSettings& settings, std::vector<Script> scripts)
+    : _scripts(std::move(scripts)), _tlsContext(MakeTlsContext(settings)) {
+  Listen();
+}
+
+LoopbackServer::~LoopbackServer() {
+  {
+    const std::lock_guard<std::mutex> lock(_mutex);
+    _isStopping = true;
+    for (const int socket : _sockets) {
+      if (socket >= 0) {
+        ::shutdown(socket, SHUT_RDWR);
+      }
+    }
+  }
+  _changed.notify_all();
+  ::shutdown(_listener, SHUT_RDWR);
+  _acceptor.join();
+  for (std::thread& thread : _threads) {
+    thread.join();
+  }
+  ::close(_listener);
+}
+
+std::string LoopbackServer::GetEndpoint() const {
+  return "127.0.0.1:" + std::to_string(_port);
+}
+
+void LoopbackServer::Listen() {
+  _listener = Bind(_port);
+  Require(::listen(_listener, kBacklog) == 0, "cannot listen");
+  _acceptor = std::thread([this] { Accept(); });
+}
+
+void LoopbackServer::Accept() {
+  BlockSigpipe();
+  for (;;) {
+    const int socket = ::accept4(_listener, nullptr, nullptr, SOCK_CLOEXEC);
+    const std::lock_guard<std::mutex> lock(_mutex);
+    if (socket < 0 || _isStopping) {
+      if (socket >= 0) {
+        ::close(socket);
+      }
+      return;
+    }
+    // Or a script that sends twice would wait for the peer's delayed acknowledgement in between.
+    const int noDelay = 1;
+    ::setsockopt(socket, IPPROTO_TCP, TCP_NODELAY, &noDelay, sizeof noDelay);
+    const std::size_t index = _records.size();
+    _records.emplace_back();
+    _sockets.push_back(socket);
+    _threads.emplace_back([this, index, socket] { Serve(index, socket); });
+    _changed.notify_all();
+  }
+}
+
+void LoopbackServer::Serve(std::size_t index, int socket) {
+  {
+    ServerConnection connection(*this, index, socket);
+    try {
+      if (_tlsContext) {
+        connection.StartTls();
+      }
+      _scripts[std::min(index, _scripts.size() - 1)](connection);
+    } catch (const Broken&) {
+      // The peer is gone, or the test is over.
+    }
+  }
+  Change(index, [](ConnectionRecord& record) { record.isEnded = true; });
+}
+
+void LoopbackServer::Change(std::size_t connection, const std::function<void(ConnectionRecord&)>& change) {
+  const std::lock_guard<std::mutex> lock(_mutex);
+  change(_records[connection]);
+  _changed.notify_all();
+}
+
+void LoopbackServer::Release() {
+  const std::lock_guard<std::mutex> lock(_mutex);
+  _isReleased = true;
+  _changed.notify_all();
+}
+
+void LoopbackServer::AwaitConnections(std::size_t count) {
+  std::unique_lock<std::mutex> lock(_mutex);
+  _changed.wait(lock, [&] { return _records.size() >= count; });
+}
+
+void LoopbackServer::AwaitRequests(std::size_t count) {
+  std::unique_lock<std::mutex> lock(_mutex);
+  _changed.wait(lock, [&] {
+    std::size_t requests = 0;
+    for (const ConnectionRecord& record : _records) {
+      requests += record.requests;
+    }
+    return requests >= count;
+  });
+}
+
+void LoopbackServer::AwaitEnd(std::size_t connection) {
+  std::unique_lock<std::mutex> lock(_mutex);
+  _changed.wait(lock, [&] { return _records.size() > connection && _records[connection].isEnded; });
+}
+
+std::size_t LoopbackServer::CountConnections() const {
+  const std::lock_guard<std::mutex> lock(_mutex);
+  return _records.size();
+}
+
+ConnectionRecord LoopbackServer::GetRecord(std::size_t connection) const {
+  const std::lock_guard<std::mutex> lock(_mutex);
+  return _records.at(connection);
+}
+
+// --- FullListener ---
+
+FullListener::FullListener() {
+  _sockets.push_back(Bind(_port));
+  Require(::listen(_sockets[0], 0) == 0, "cannot listen");
+  const sockaddr_in address = MakeAddress(_port);
+  tcp_info info = {};
+  // Loopback connections that find room are established when connect() returns; the first that is not found
+  // the queue full.
+  do {
+    const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+    Require(socket >= 0, "no socket");
+    _sockets.push_back(socket);
+    static_cast<void>(::connect(socket, reinterpret_cast<const sockaddr*>(&address), sizeof address));
+    socklen_t size = sizeof info;
+    Require(::getsockopt(socket, IPPROTO_TCP, TCP_INFO, &info, &size) == 0, "no socket state");
+  } while (info.tcpi_state != TCP_SYN_SENT);
+}
+
+FullListener::~FullListener() {
+  for (const int socket : _sockets) {
+    ::close(socket);
+  }
+}
+
+// --- ClosedPort ---
+
+ClosedPort::ClosedPort() : _socket(Bind(_port)) {}
+
+ClosedPort::~ClosedPort() {
+  ::close(_socket);
+}
+
+}  // namespace TestSupport
