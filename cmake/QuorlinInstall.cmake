@@ -10,7 +10,7 @@ include(CMakePackageConfigHelpers)
 file(RELATIVE_PATH pc_to_prefix "/prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/prefix")
 string(REGEX REPLACE "/$" "" pc_to_prefix "${pc_to_prefix}")
 if(QUORLIN_LIBRARY_TYPE STREQUAL "STATIC")
-  set(pc_pelmar_requires "expat openssl >= 3.0 libcurl >= 7.85")
+  set(pc_pelmar_requires "expat openssl >= 3.0 libcurl >= 7.87")
 endif()
 
 function(quorlin_install_library target name package)

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 //
-// Stands in for libFuzzer where it is not linked: runs the fuzz target once over every file named on the command line,
-// and over every file below each folder named there. A name that is missing or holds no file is an error, so that a
-// lost corpus cannot pass for a clean run.
+// Stands in for libFuzzer where it is not linked: runs the fuzz target once over every file named on the
+// command line, and over every file below each folder named there. A name that is missing or holds no file is
+// an error, so that a lost corpus cannot pass for a clean run.
 
 #include <algorithm>
 #include <cstddef>

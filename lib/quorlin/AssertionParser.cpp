@@ -84,7 +84,8 @@ void ParseX509CertificateElement(const NodeFilterIterator& it, SubjectConfirmati
   RequireNoAttributes(RequireElement(it, "X509Certificate", kSignatureNamespace));
   std::string base64;
   RequireTextualContent(it, base64);
-  data.KeyInfoCertificate = Pelmar::Crypto::CreateCertificateFromDer(Pelmar::StringUtil::Base64Decode(base64));
+  data.KeyInfoCertificate =
+      Pelmar::Crypto::CreateCertificateFromDer(Pelmar::StringUtil::Base64Decode(base64));
 }
 
 void ParseX509DataElement(const NodeFilterIterator& it, SubjectConfirmationDataType& data) {
@@ -100,7 +101,8 @@ bool IsConditionOfType(const NodeFilterIterator& it, const QName& type) {
   return ElementQNameIs(element, "Condition", kSaml) && ElementXsiTypeIs(element, type);
 }
 
-// Reads the restriction under `it`, whichever it is, and moves on. False when it is none that is still allowed.
+// Reads the restriction under `it`, whichever it is, and moves on. False when it is none that is still
+// allowed.
 bool TryParseRestriction(NodeFilterIterator& it, ConditionsType& conditions) {
   const Pelmar::Xml::Node* const before = it.node;
   if (!conditions.AudienceRestriction) {
@@ -242,7 +244,8 @@ void ParseConditionsElement(NodeFilterIterator it, ConditionsType& conditions) {
   }
 }
 
-void TryParseAudienceRestriction(NodeFilterIterator& it, boost::optional<AudienceRestrictionType>& restriction) {
+void TryParseAudienceRestriction(NodeFilterIterator& it,
+                                 boost::optional<AudienceRestrictionType>& restriction) {
   if (!ElementQNameIs(IteratorToElement(it), "AudienceRestriction", kSaml)) {
     return;
   }
@@ -274,14 +277,16 @@ void TryParseRenewRestriction(NodeFilterIterator& it, boost::optional<RenewRestr
   }
   const ElementNode* element = IteratorToElement(it);
   RenewRestrictionType parsed;
-  RequireElementAttributesQNames(element, QNames{kXsiType},
-                                 QNames{LocalName("Count"), LocalName("Postdatable"), LocalName("RenewExpired")});
+  RequireElementAttributesQNames(
+      element, QNames{kXsiType},
+      QNames{LocalName("Count"), LocalName("Postdatable"), LocalName("RenewExpired")});
   GetULongOptionalAttribute(element, "Count", parsed.Count);
   restriction = parsed;
   it.MoveToSibling();
 }
 
-void TryParseDelegationRestriction(NodeFilterIterator& it, boost::optional<DelegationRestrictionType>& restriction) {
+void TryParseDelegationRestriction(NodeFilterIterator& it,
+                                   boost::optional<DelegationRestrictionType>& restriction) {
   if (!IsConditionOfType(it, kDelegationRestrictionType)) {
     return;
   }

@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// The strict reader of the SAML 2.0 assertion subset that the token service issues (SAML 2.0 Core, section 2).
+// The strict reader of the SAML 2.0 assertion subset that the token service issues (SAML 2.0 Core, section
+// 2).
 //
-// Elements stand in a fixed order, in their namespaces, with exactly the listed attributes; white space and comments between them are
-// ignored; everything else is a ParseException. Every function is given the iterator on the element that it reads.
+// Elements stand in a fixed order, in their namespaces, with exactly the listed attributes; white space and
+// comments between them are ignored; everything else is a ParseException. Every function is given the
+// iterator on the element that it reads.
 
 #ifndef QUORLIN_ASSERTIONPARSER_H
 #define QUORLIN_ASSERTIONPARSER_H
@@ -38,12 +40,14 @@ void ParseAttributeStatementElement(NodeFilterIterator it, AttributeStatementTyp
 void ParseAttributeElement(NodeFilterIterator it, AttributeType& attribute);
 void ParseRsaAdviceElement(NodeFilterIterator it, Advice& advice);
 
-/// Optional elements: when the current one is theirs, they fill the record and move on to the next significant sibling; otherwise the
-/// record stays empty and the iterator where it is.
-void TryParseAudienceRestriction(NodeFilterIterator& it, boost::optional<AudienceRestrictionType>& restriction);
+/// Optional elements: when the current one is theirs, they fill the record and move on to the next
+/// significant sibling; otherwise the record stays empty and the iterator where it is.
+void TryParseAudienceRestriction(NodeFilterIterator& it,
+                                 boost::optional<AudienceRestrictionType>& restriction);
 void TryParseProxyRestriction(NodeFilterIterator& it, boost::optional<ProxyRestrictionType>& restriction);
 void TryParseRenewRestriction(NodeFilterIterator& it, boost::optional<RenewRestrictionType>& restriction);
-void TryParseDelegationRestriction(NodeFilterIterator& it, boost::optional<DelegationRestrictionType>& restriction);
+void TryParseDelegationRestriction(NodeFilterIterator& it,
+                                   boost::optional<DelegationRestrictionType>& restriction);
 void TryParseAdviceElement(NodeFilterIterator& it, boost::optional<AdviceType>& advice);
 
 }  // namespace Quorlin

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// What the assertion parser reads, element by element, before any of it is believed. Names follow SAML 2.0 Core's schema types.
+// What the assertion parser reads, element by element, before any of it is believed. Names follow SAML 2.0
+// Core's schema types.
 
 #ifndef QUORLIN_SAMLASSERTIONTYPE_H
 #define QUORLIN_SAMLASSERTIONTYPE_H
@@ -25,7 +26,7 @@ namespace Quorlin {
 typedef std::pair<std::string, std::string> NameIDType;
 
 struct SubjectConfirmationDataType {
-  Pelmar::System::DateTime NotOnOrAfter;                                 ///< Bearer only.
+  Pelmar::System::DateTime NotOnOrAfter;                              ///< Bearer only.
   Pelmar::Ref<const Pelmar::Crypto::Certificate> KeyInfoCertificate;  ///< Holder-of-key only.
 };
 

@@ -26,17 +26,19 @@ using Pelmar::Xml::Security::Signature;
 
 namespace {
 
-typedef std::list<Ref<const Certificate> > CertificateList;
+typedef std::list<Ref<const Certificate>> CertificateList;
 
 const char* const kSource = "lib/quorlin/SamlTokenImpl";
 
 std::string CanonicalText(const ElementNode* element) {
   const Ref<Pelmar::StringWriter> writer = Pelmar::CreateStringWriter();
-  Pelmar::Xml::Security::CreateCanonicalizer(Pelmar::Xml::Security::kC14n)->Canonicalize(element, writer.Get());
+  Pelmar::Xml::Security::CreateCanonicalizer(Pelmar::Xml::Security::kC14n)
+      ->Canonicalize(element, writer.Get());
   return writer->GetText();
 }
 
-// A use that may be repeated at least once more. A restriction without a count, or with a count of 0, permits none.
+// A use that may be repeated at least once more. A restriction without a count, or with a count of 0, permits
+// none.
 template <typename Restriction>
 bool PermitsFurtherUse(const boost::optional<Restriction>& restriction) {
   return restriction && restriction->Count && *restriction->Count != 0;
@@ -66,7 +68,8 @@ Delegate::Delegate(const PrincipalId& delegate, const DateTime& instant)
 
 // --- Construction ---
 
-SamlTokenImpl::SamlTokenImpl(const std::string& xml, const KeyInfoResolver* resolver, long long clockToleranceSec)
+SamlTokenImpl::SamlTokenImpl(const std::string& xml, const KeyInfoResolver* resolver,
+                             long long clockToleranceSec)
     : _xml(xml) {
   Ref<Pelmar::Xml::Document> document;
   ParseXML(_xml, document);
@@ -74,14 +77,15 @@ SamlTokenImpl::SamlTokenImpl(const std::string& xml, const KeyInfoResolver* reso
   Pelmar::Verify(_subject.get() != nullptr, "_subject", kSource);
 }
 
-SamlTokenImpl::SamlTokenImpl(ElementNode* element, const KeyInfoResolver* resolver, long long clockToleranceSec)
+SamlTokenImpl::SamlTokenImpl(ElementNode* element, const KeyInfoResolver* resolver,
+                             long long clockToleranceSec)
     : _xml(CanonicalText(element)) {
   InitializeFromDom(element, resolver, clockToleranceSec);
   Pelmar::Verify(_subject.get() != nullptr, "_subject", kSource);
 }
 
-// The cheap checks come first, so a token that is out of date costs no public-key operation. Nothing that the assertion says is
-// interpreted before its signature held.
+// The cheap checks come first, so a token that is out of date costs no public-key operation. Nothing that the
+// assertion says is interpreted before its signature held.
 void SamlTokenImpl::InitializeFromDom(ElementNode* element, const KeyInfoResolver* resolver,
                                       long long clockToleranceSec) {
   const NodeFilterIterator it(element, boost::make_shared<SkipWsAndCommentsFilter>());
@@ -212,13 +216,16 @@ const std::string& SamlTokenImpl::ToXml() const {
 
 // --- Creation ---
 
-boost::shared_ptr<SamlToken> CreateSamlToken(const std::string& xml, const CertificateList& trustedCertificates,
+boost::shared_ptr<SamlToken> CreateSamlToken(const std::string& xml,
+                                             const CertificateList& trustedCertificates,
                                              long long clockToleranceSec) {
-  const Ref<KeyInfoResolver> resolver = Pelmar::Xml::Security::CreateTrustChainKeyResolver(trustedCertificates);
+  const Ref<KeyInfoResolver> resolver =
+      Pelmar::Xml::Security::CreateTrustChainKeyResolver(trustedCertificates);
   return boost::make_shared<SamlTokenImpl>(xml, resolver.Get(), clockToleranceSec);
 }
 
-boost::shared_ptr<SamlToken> CreateSamlToken(const std::string& xml, const CertificateList& trustedCertificates) {
+boost::shared_ptr<SamlToken> CreateSamlToken(const std::string& xml,
+                                             const CertificateList& trustedCertificates) {
   return CreateSamlToken(xml, trustedCertificates, 0);
 }
 
@@ -226,9 +233,11 @@ boost::shared_ptr<SamlToken> CreateSamlToken(const std::string& xml, const Certi
   return CreateSamlToken(xml, CertificateList(1, Ref<const Certificate>(trustedCertificate)));
 }
 
-boost::shared_ptr<SamlToken> CreateSamlTokenFromDom(ElementNode* assertion, const CertificateList& trustedCertificates,
+boost::shared_ptr<SamlToken> CreateSamlTokenFromDom(ElementNode* assertion,
+                                                    const CertificateList& trustedCertificates,
                                                     long long clockToleranceSec) {
-  const Ref<KeyInfoResolver> resolver = Pelmar::Xml::Security::CreateTrustChainKeyResolver(trustedCertificates);
+  const Ref<KeyInfoResolver> resolver =
+      Pelmar::Xml::Security::CreateTrustChainKeyResolver(trustedCertificates);
   return boost::make_shared<SamlTokenImpl>(assertion, resolver.Get(), clockToleranceSec);
 }
 

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// The token behind the SamlToken interface: built in one go from an assertion that passed every check, then only read.
+// The token behind the SamlToken interface: built in one go from an assertion that passed every check, then
+// only read.
 
 #ifndef QUORLIN_SAMLTOKENIMPL_H
 #define QUORLIN_SAMLTOKENIMPL_H

@@ -34,7 +34,8 @@ void CheckValidityPeriod(const ConditionsType& conditions, long long clockTolera
   const long long start = conditions.NotBefore.GetUtcTime();
   const long long end = conditions.NotOnOrAfter.GetUtcTime();
   if (start >= end) {
-    throw ParseException("Unsatisfiable token validity conditions: NotBefore must be less than NotOnOrAfter.");
+    throw ParseException(
+        "Unsatisfiable token validity conditions: NotBefore must be less than NotOnOrAfter.");
   }
   const long long tolerance = ToleranceInMicroseconds(clockToleranceSec);
   const long long now = Pelmar::System::GetUtcDateTime().GetUtcTime();
@@ -60,10 +61,12 @@ void CheckDelegation(const SamlAssertionType& assertion) {
   const boost::optional<NameIDType>& delegateId = assertion.Subject.SubjectConfirmation.DelegateId;
   const boost::optional<DelegationRestrictionType>& restriction = assertion.Conditions.DelegationRestriction;
   if (delegateId && !restriction) {
-    throw ParseException("Token SubjectConfirmation contains delegate id, but no delegation restriction is present");
+    throw ParseException(
+        "Token SubjectConfirmation contains delegate id, but no delegation restriction is present");
   }
   if (!delegateId && restriction) {
-    throw ParseException("Token has delegation restriction, but no delegate id is present in the SubjectConfirmation");
+    throw ParseException(
+        "Token has delegation restriction, but no delegate id is present in the SubjectConfirmation");
   }
   if (delegateId && *delegateId != restriction->Delegate.back().NameID) {
     throw ParseException("The SubjectConfirmation delegate id does not match the id of the last delegate");
@@ -81,7 +84,7 @@ Ref<Signature> ReadSignature(ElementNode* assertionElement, ElementNode* signatu
 }
 
 bool CoversAssertion(const Signature& signature, const std::string& id) {
-  const std::vector<Ref<SignatureReference> >& references = signature.GetReferences();
+  const std::vector<Ref<SignatureReference>>& references = signature.GetReferences();
   return std::any_of(references.begin(), references.end(), [&](const Ref<SignatureReference>& reference) {
     return reference->GetUri().empty() || reference->GetUri() == "#" + id;
   });
@@ -148,7 +151,8 @@ PrincipalId ParseGroupIdentity(const std::string& value) {
   std::string first;
   std::string second;
   if (!SplitInTwo(value, domainFirst ? '\\' : '/', first, second)) {
-    throw ParseException("Failed to parse Group Identity value: `" + value + "'; too many/not enough separators");
+    throw ParseException("Failed to parse Group Identity value: `" + value +
+                         "'; too many/not enough separators");
   }
   return domainFirst ? PrincipalId(second, first) : PrincipalId(first, second);
 }

@@ -148,8 +148,9 @@ void ResolveQName(const ElementNode* element, const std::string& text, const std
   const std::string prefix = text.substr(0, colon);
   const std::string* uri = element->FindNamespaceUri(prefix);
   if (uri == nullptr) {
-    throw ParseException("Element " + element->GetLocalName() + "at " + std::to_string(element->GetLine()) + "," +
-                         std::to_string(element->GetColumn()) + " uses undefined prefix: `" + prefix + "'");
+    throw ParseException("Element " + element->GetLocalName() + "at " + std::to_string(element->GetLine()) +
+                         "," + std::to_string(element->GetColumn()) + " uses undefined prefix: `" + prefix +
+                         "'");
   }
   result = QName(*uri, text.substr(colon + 1));
 }
@@ -176,7 +177,8 @@ void RequireTextualContent(NodeFilterIterator it, std::string& text) {
   if (content == nullptr) {
     ThrowNotTextual(element);
   }
-  // A second significant child means that a comment or an instruction splits the text: its readers would disagree on the value.
+  // A second significant child means that a comment or an instruction splits the text: its readers would
+  // disagree on the value.
   if (it.MoveToSibling().node != nullptr) {
     ThrowNotTextual(element);
   }
@@ -215,7 +217,8 @@ void RequireElementAttributesQNames(const ElementNode* element, const std::vecto
     if (Contains(required, name)) {
       ++found;
     } else if (!Contains(allowed, name)) {
-      throw ParseException("Unexpected attribute '" + name.ToString() + "' on element '" + element->GetLocalName() + "'");
+      throw ParseException("Unexpected attribute '" + name.ToString() + "' on element '" +
+                           element->GetLocalName() + "'");
     }
   }
   if (found >= required.size()) {

@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// Strict reading of XML trees: the one way in which every reader of foreign XML in this library walks a document.
+// Strict reading of XML trees: the one way in which every reader of foreign XML in this library walks a
+// document.
 //
-// These functions decide what counts as insignificant (white space and comments), how a prefix in a value is resolved, and the
-// exact wording of every structural error. All errors are ParseException. Nothing is logged.
+// These functions decide what counts as insignificant (white space and comments), how a prefix in a value is
+// resolved, and the exact wording of every structural error. All errors are ParseException. Nothing is
+// logged.
 
 #ifndef QUORLIN_XMLREADING_H
 #define QUORLIN_XMLREADING_H
@@ -34,8 +36,8 @@ class NodeFilter {
   ~NodeFilter() {}
 };
 
-/// Rejects comments, and texts made of tab, line feed, carriage return and blank only. Accepts everything else, processing instructions
-/// included: what is not understood must not be overlooked.
+/// Rejects comments, and texts made of tab, line feed, carriage return and blank only. Accepts everything
+/// else, processing instructions included: what is not understood must not be overlooked.
 class SkipWsAndCommentsFilter final : public NodeFilter {
  public:
   bool Accept(Pelmar::Xml::Node* node) const override;
@@ -52,7 +54,7 @@ class NodeFilterIterator {
   NodeFilterIterator& MoveToChild();
   NodeFilterIterator GetChild() const;
 
-  Pelmar::Xml::Node* node;                       ///< Not owned.
+  Pelmar::Xml::Node* node;                     ///< Not owned.
   boost::shared_ptr<const NodeFilter> filter;  ///< Shared by all copies.
 };
 
@@ -75,16 +77,18 @@ bool ElementQNameIs(const Pelmar::Xml::ElementNode* element, const char* localNa
 bool ElementXsiTypeIs(const Pelmar::Xml::ElementNode* element, const Pelmar::Xml::QName& type);
 
 /// Expands the prefixed name `text` as it stands on `element`; an unprefixed one is in `defaultNamespace`.
-void ResolveQName(const Pelmar::Xml::ElementNode* element, const std::string& text, const std::string& defaultNamespace,
-                  Pelmar::Xml::QName& result);
+void ResolveQName(const Pelmar::Xml::ElementNode* element, const std::string& text,
+                  const std::string& defaultNamespace, Pelmar::Xml::QName& result);
 
-void RequireElementQName(const Pelmar::Xml::ElementNode* element, const char* localName, const char* namespaceUri);
+void RequireElementQName(const Pelmar::Xml::ElementNode* element, const char* localName,
+                         const char* namespaceUri);
 void RequireEmptyElement(NodeFilterIterator it);
 /// The element must have one significant child and that must be a text, which is returned untrimmed.
 void RequireTextualContent(NodeFilterIterator it, std::string& text);
 void RequireNoAttributes(const Pelmar::Xml::ElementNode* element);
 /// Compares attribute names as they are written, prefix included. Namespace declarations are always allowed.
-void RequireElementAttributesNames(const Pelmar::Xml::ElementNode* element, const std::vector<std::string>& required,
+void RequireElementAttributesNames(const Pelmar::Xml::ElementNode* element,
+                                   const std::vector<std::string>& required,
                                    const std::vector<std::string>& allowed);
 /// Compares attribute names by what their prefixes stand for. Namespace declarations are always allowed.
 void RequireElementAttributesQNames(const Pelmar::Xml::ElementNode* element,
@@ -92,7 +96,8 @@ void RequireElementAttributesQNames(const Pelmar::Xml::ElementNode* element,
                                     const std::vector<Pelmar::Xml::QName>& allowed);
 
 /// Typed attribute readers. A missing attribute reads as the empty text. On failure `value` is unchanged.
-void GetDateAttribute(const Pelmar::Xml::ElementNode* element, const char* name, Pelmar::System::DateTime& value);
+void GetDateAttribute(const Pelmar::Xml::ElementNode* element, const char* name,
+                      Pelmar::System::DateTime& value);
 void GetBoolAttribute(const Pelmar::Xml::ElementNode* element, const char* name, bool& value);
 /// A missing attribute leaves `value` as it is. Accepts 0 to the largest signed 64-bit number.
 void GetULongOptionalAttribute(const Pelmar::Xml::ElementNode* element, const char* name,

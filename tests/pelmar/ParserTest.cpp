@@ -385,13 +385,13 @@ TEST(XMLParserLimits, BoundNamespaceDeclarationsInScope) {
 TEST(XMLParserLimits, BoundNodes) {
   EXPECT_EQ(LimitOutcome("<r>" + Repeated("<a/>", kMaxNodes - 1) + "</r>"), "accepted");
   EXPECT_EQ(LimitOutcome("<r>\n" + Repeated("<a/>", kMaxNodes) + "</r>"),
-            "more than 1048576 nodes at line 2, column 4194301");
+            "more than 262144 nodes at line 2, column 1048573");
   EXPECT_EQ(LimitOutcome("<r>\n" + Repeated("<a b=''/>", kMaxNodes / 2) + "</r>"),
-            "more than 1048576 nodes at line 2, column 4718584");
+            "more than 262144 nodes at line 2, column 1179640");
   EXPECT_EQ(LimitOutcome("<r>\n" + Repeated("<!---->", kMaxNodes) + "</r>"),
-            "more than 1048576 nodes at line 2, column 7340026");
+            "more than 262144 nodes at line 2, column 1835002");
   EXPECT_EQ(LimitOutcome("<r>\n" + Repeated("<?p?>", kMaxNodes) + "</r>"),
-            "more than 1048576 nodes at line 2, column 5242876");
+            "more than 262144 nodes at line 2, column 1310716");
 }
 
 TEST(XMLParserLimits, BoundTheDocument) {

@@ -659,7 +659,7 @@ TEST(TokenAttack, ManyNodesAreRefused) {
   const std::size_t nodesBefore = 32;  // Elements and attributes up to the subject.
   const std::size_t column = bad.find("<a/>") + 4 * (Pelmar::Xml::kMaxNodes - nodesBefore) + 1;
   EXPECT_EQ(VerdictOnToken(bad),
-            Malformed("more than 1048576 nodes at line 1, column " + std::to_string(column)));
+            Malformed("more than 262144 nodes at line 1, column " + std::to_string(column)));
 }
 
 TEST(TokenAttack, LargeTokensWithinTheLimitsAreRead) {

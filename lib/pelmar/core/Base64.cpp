@@ -7,8 +7,9 @@
 #include <openssl/evp.h>
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
-#include <iterator>
+#include <string_view>
 
 namespace Pelmar {
 namespace StringUtil {
@@ -20,19 +21,39 @@ constexpr std::size_t kLettersPerGroup = 4;
 // OpenSSL counts in int; longer input goes through in pieces of whole groups.
 constexpr std::size_t kMaxGroupsPerCall = 1u << 20;
 
-bool IsXmlWhiteSpace(char c) {
-  return c == ' ' || c == '\t' || c == '\r' || c == '\n';
+enum class ByteClass : unsigned char { OTHER, LETTER, WHITE_SPACE };
+
+using ByteClasses = std::array<ByteClass, 256>;
+
+constexpr void Mark(ByteClasses& classes, std::string_view bytes, ByteClass byteClass) {
+  for (const char byte : bytes) {
+    classes[static_cast<unsigned char>(byte)] = byteClass;
+  }
+}
+
+// RFC 4648, section 4, and the white space of XML 1.0, production 3.
+constexpr ByteClasses MakeByteClasses() {
+  ByteClasses classes = {};
+  Mark(classes, "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/", ByteClass::LETTER);
+  Mark(classes, " \t\r\n", ByteClass::WHITE_SPACE);
+  return classes;
+}
+
+constexpr ByteClasses kByteClasses = MakeByteClasses();
+
+ByteClass ClassOf(char c) {
+  return kByteClasses[static_cast<unsigned char>(c)];
 }
 
 bool IsBase64Letter(char c) {
-  return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == '+' || c == '/';
+  return ClassOf(c) == ByteClass::LETTER;
 }
 
 std::string RemoveWhiteSpace(const std::string& text) {
-  std::string letters;
-  letters.reserve(text.size());
-  std::copy_if(text.begin(), text.end(), std::back_inserter(letters),
-               [](char c) { return !IsXmlWhiteSpace(c); });
+  std::string letters = text;
+  const auto end = std::remove_if(letters.begin(), letters.end(),
+                                  [](char c) { return ClassOf(c) == ByteClass::WHITE_SPACE; });
+  letters.erase(end, letters.end());
   return letters;
 }
 
@@ -96,7 +117,7 @@ std::string Base64Encode(const std::vector<unsigned char>& bytes) {
     EVP_EncodeBlock(letters.data() + done / kBytesPerGroup * kLettersPerGroup, bytes.data() + done,
                     static_cast<int>(count));
   }
-  return std::string(letters.begin(), letters.end() - 1);
+  return std::string(reinterpret_cast<const char*>(letters.data()), size);
 }
 
 std::vector<unsigned char> Base64Decode(const std::string& text) {

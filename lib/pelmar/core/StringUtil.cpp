@@ -12,6 +12,8 @@
 #include <algorithm>
 #include <array>
 #include <cstddef>
+#include <cstdint>
+#include <cstring>
 
 namespace Pelmar {
 namespace StringUtil {
@@ -56,6 +58,17 @@ std::string MapEach(std::string text, char (*map)(char)) {
   return text;
 }
 
+// Eight bytes of ASCII without control characters, of which nearly all text consists: nothing is to be
+// decided about them.
+bool ArePlainAscii(const char* text) {
+  constexpr std::uint64_t kEach = 0x0101010101010101u;
+  std::uint64_t bytes = 0;
+  std::memcpy(&bytes, text, sizeof(bytes));
+  // With all high bits clear, subtracting 0x20 from each byte borrows, and so sets a high bit, exactly when
+  // one of them is below that.
+  return ((bytes | (bytes - kEach * 0x20)) & (kEach * 0x80)) == 0;
+}
+
 // XML 1.0, production 2 (Char), for what is already a Unicode scalar value.
 bool IsXmlCharacter(char32_t c) {
   if (c < 0x20) {
@@ -86,6 +99,10 @@ std::string ToUpper(const std::string& text) {
 bool IsXmlText(const std::string& text) {
   std::size_t position = 0;
   while (position < text.size()) {
+    if (text.size() - position >= sizeof(std::uint64_t) && ArePlainAscii(text.data() + position)) {
+      position += sizeof(std::uint64_t);
+      continue;
+    }
     char32_t character = 0;
     const std::size_t length = ReadUtf8(text, position, character);
     if (length == 0 || !IsXmlCharacter(character)) {

@@ -6,22 +6,35 @@
 #include "pelmar/xml/ExpatHandle.h"
 
 #include <algorithm>
+#include <array>
+#include <cstddef>
 
 namespace Pelmar {
 namespace Xml {
 
 namespace {
 
-bool IsAsciiLetter(char c) noexcept {
+constexpr bool IsAsciiLetter(char c) noexcept {
   return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
 }
 
-bool IsAscii(char c) noexcept {
+constexpr bool IsAscii(char c) noexcept {
   return static_cast<unsigned char>(c) < 0x80;
 }
 
+constexpr std::array<bool, 256> MarkNameBytes() noexcept {
+  std::array<bool, 256> marks = {};
+  for (std::size_t byte = 0; byte < marks.size(); ++byte) {
+    const char c = static_cast<char>(byte);
+    marks[byte] =
+        !IsAscii(c) || IsAsciiLetter(c) || (c >= '0' && c <= '9') || c == '_' || c == '-' || c == '.';
+  }
+  return marks;
+}
+
 bool MayContinueName(char c) noexcept {
-  return !IsAscii(c) || IsAsciiLetter(c) || (c >= '0' && c <= '9') || c == '_' || c == '-' || c == '.';
+  static constexpr std::array<bool, 256> kMarks = MarkNameBytes();
+  return kMarks[static_cast<unsigned char>(c)];
 }
 
 template <typename Predicate>

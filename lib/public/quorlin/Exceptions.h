@@ -3,8 +3,9 @@
 
 // The library's exceptions.
 //
-// Every failure is reported by throwing; there are no error codes. Errors in a caller's arguments are the platform's
-// Pelmar::InvalidArgumentException and Pelmar::InvalidStateException. All of them derive from Pelmar::Exception.
+// Every failure is reported by throwing; there are no error codes. Errors in a caller's arguments are the
+// platform's Pelmar::InvalidArgumentException and Pelmar::InvalidStateException. All of them derive from
+// Pelmar::Exception.
 
 #ifndef QUORLIN_EXCEPTIONS_H
 #define QUORLIN_EXCEPTIONS_H
@@ -16,7 +17,8 @@
 
 namespace Quorlin {
 
-/// The service's answer is unusable, or a token it returned does not parse or validate. Base of all exceptions of this library.
+/// The service's answer is unusable, or a token it returned does not parse or validate. Base of all
+/// exceptions of this library.
 class QUORLIN_API SsoException : public Pelmar::Exception {
  public:
   explicit SsoException(const std::string& message);
@@ -52,8 +54,8 @@ class QUORLIN_API InvalidSignatureException : public InvalidTokenException {
   [[noreturn]] void Throw() const override;
 };
 
-/// A token's XML is outside the accepted subset of SAML 2.0, or one of its conditions does not hold (expired, not yet valid,
-/// inconsistent delegation).
+/// A token's XML is outside the accepted subset of SAML 2.0, or one of its conditions does not hold (expired,
+/// not yet valid, inconsistent delegation).
 class QUORLIN_API ParseException : public InvalidTokenException {
  public:
   explicit ParseException(const std::string& message);

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// Marks what the shared library hands out. Everything else is compiled with hidden visibility. Also readable by a C compiler.
+// Marks what the shared library hands out. Everything else is compiled with hidden visibility. Also readable
+// by a C compiler.
 
 #ifndef QUORLIN_EXPORT_H
 #define QUORLIN_EXPORT_H

@@ -38,8 +38,8 @@ struct AdviceAttribute {
   std::vector<std::string> values;
 };
 
-/// What a source (an application, say) asked the service to write into the token about the subject. The service vouches for having been
-/// told, not for the content.
+/// What a source (an application, say) asked the service to write into the token about the subject. The
+/// service vouches for having been told, not for the content.
 struct Advice {
   std::string source;
   std::vector<AdviceAttribute> attributes;  ///< In document order.
@@ -47,16 +47,21 @@ struct Advice {
 
 /// A SAML 2.0 token that passed every check.
 ///
-/// An object of this type exists only if its assertion was read by the strict parser, its conditions held at that moment, and its
-/// signature covered it and verified against the trusted certificates. It never changes and may be read from several threads.
-/// Ownership: always by `boost::shared_ptr`, which deletes the concrete class. References that are returned live as long as the token;
-/// the getters with an output argument replace what it held.
+/// An object of this type exists only if its assertion was read by the strict parser, its conditions held at
+/// that moment, and its signature covered it and verified against the trusted certificates. It never changes
+/// and may be read from several threads.
+///
+/// Ownership: always by `boost::shared_ptr`, which deletes the concrete
+/// class. References that are returned live as long as the token; the getters with an output argument replace
+/// what it held.
 class QUORLIN_API SamlToken {
  public:
   /// How the bearer proves to be the subject (SAML 2.0 Profiles, section 3).
   enum ConfirmationType : int {
-    CONFIRM_BEARER = 0,        ///< urn:oasis:names:tc:SAML:2.0:cm:bearer: whoever has the token.
-    CONFIRM_HOLDER_OF_KEY = 1  ///< urn:oasis:names:tc:SAML:2.0:cm:holder-of-key: who has the confirmation certificate's key.
+    /// urn:oasis:names:tc:SAML:2.0:cm:bearer: whoever has the token.
+    CONFIRM_BEARER = 0,
+    /// urn:oasis:names:tc:SAML:2.0:cm:holder-of-key: who has the confirmation certificate's key.
+    CONFIRM_HOLDER_OF_KEY = 1
   };
 
   /// The assertion's ID.
@@ -79,48 +84,62 @@ class QUORLIN_API SamlToken {
   virtual void GetGroups(std::vector<PrincipalId>& groups) const = 0;
   /// Through whom the subject's identity was delegated, first delegate first; empty when it was not.
   virtual void GetDelegationChain(std::vector<Delegate>& delegationChain) const = 0;
-  /// URIs of the services that may accept the token; empty: any. Checking it is the receiving service's business.
+  /// URIs of the services that may accept the token; empty: any. Checking it is the receiving service's
+  /// business.
   virtual void GetAudience(std::set<std::string>& audience) const = 0;
   virtual void GetAdvice(std::vector<Advice>& advice) const = 0;
   /// The certificate whose key a holder-of-key token is bound to; null for a bearer token.
   virtual const Pelmar::Crypto::Certificate* GetConfirmationCertificate() const = 0;
-  /// The token's XML: the text it was made from, byte for byte, or the canonical form of the element it was made from.
+  /// The token's XML: the text it was made from, byte for byte, or the canonical form of the element it was
+  /// made from.
   virtual const std::string& ToXml() const = 0;
 
  protected:
-  /// Not virtual: a token is only ever deleted as its concrete class, by the shared pointer that was made with it.
+  /// Not virtual: a token is only ever deleted as its concrete class, by the shared pointer that was made
+  /// with it.
   ~SamlToken() {}
 };
 
 /// The token in `xml`, which must be one SAML 2.0 assertion document.
 ///
-/// `trustedCertificates` are those of the token service: the signature is accepted only if its certificate is one of them or chains to one
-/// of them. Null entries are skipped; an empty list accepts nothing. `clockToleranceSec` widens the validity period on both sides, in
-/// seconds, for clocks that disagree.
-/// Throws ParseException for anything outside the accepted subset or its conditions, InvalidSignatureException when the
-/// signature does not verify, Pelmar::Xml::XMLParseException for text that is not well-formed XML.
+/// `trustedCertificates` are those of the token service: the signature is accepted only if its certificate is
+/// one of them or chains to one of them. Null entries are skipped; an empty list accepts nothing.
+/// `clockToleranceSec` widens the validity period on both sides, in seconds, for clocks that disagree.
+/// Throws:
+/// - ParseException for anything outside the accepted subset, or a condition that does not hold. For an
+///   isSolution attribute without exactly one value a *pointer* to a new ParseException is thrown: catch it
+///   too, and delete it;
+/// - InvalidSignatureException when the signature does not verify;
+/// - Pelmar::Xml::XMLParseException for text that is not well-formed XML or beyond the parser's limits;
+/// - Pelmar::Base64FormatException or Pelmar::Crypto::CryptoException for a bad confirmation certificate.
 QUORLIN_API boost::shared_ptr<SamlToken> CreateSamlToken(
-    const std::string& xml, const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate> >& trustedCertificates,
+    const std::string& xml,
+    const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>& trustedCertificates,
     long long clockToleranceSec);
 
 /// The same with no clock tolerance.
 QUORLIN_API boost::shared_ptr<SamlToken> CreateSamlToken(
-    const std::string& xml, const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate> >& trustedCertificates);
+    const std::string& xml,
+    const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>& trustedCertificates);
 
 /// The same with one trusted certificate (null: nothing is trusted) and no clock tolerance.
-QUORLIN_API boost::shared_ptr<SamlToken> CreateSamlToken(const std::string& xml,
-                                                         const Pelmar::Crypto::Certificate* trustedCertificate);
+QUORLIN_API boost::shared_ptr<SamlToken> CreateSamlToken(
+    const std::string& xml, const Pelmar::Crypto::Certificate* trustedCertificate);
 
-/// The token in an assertion element that is part of a tree, which must not change during the call. Its text (`ToXml`) is the element's
-/// canonical form (Canonical XML 1.0 without comments), which stands on its own. Otherwise like the functions above.
+/// The token in an assertion element that is part of a tree, which must not change during the call. Its text
+/// (`ToXml`) is the element's canonical form (Canonical XML 1.0 without comments): it takes along the
+/// namespace declarations, and the xml: attributes if there are any, of the elements around it. Otherwise
+/// like the functions above; an undeclared prefix below the element is a
+/// Pelmar::Xml::Security::XmlSecurityException.
 QUORLIN_API boost::shared_ptr<SamlToken> CreateSamlTokenFromDom(
     Pelmar::Xml::ElementNode* assertion,
-    const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate> >& trustedCertificates, long long clockToleranceSec);
+    const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>& trustedCertificates,
+    long long clockToleranceSec);
 
 /// The same with no clock tolerance.
 QUORLIN_API boost::shared_ptr<SamlToken> CreateSamlTokenFromDom(
     Pelmar::Xml::ElementNode* assertion,
-    const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate> >& trustedCertificates);
+    const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>& trustedCertificates);
 
 }  // namespace Quorlin
 

@@ -35,8 +35,9 @@ struct SPNegoResponse {
 /// The client's side of a GSS/SPNEGO negotiation, supplied by the caller.
 class QUORLIN_API NegotiationHandler {
  public:
-  /// Answers the service's message with the client's next one. The first call gets an empty message. Never return null; an empty
-  /// message is only allowed once the negotiation is complete. Called on the thread of the operation, one round after another.
+  /// Answers the service's message with the client's next one. The first call gets an empty message. Never
+  /// return null; an empty message is only allowed once the negotiation is complete. Called on the thread of
+  /// the operation, one round after another.
   virtual boost::shared_ptr<Leg> Negotiate(const Leg& serverLeg) = 0;
 
  protected:
@@ -44,50 +45,64 @@ class QUORLIN_API NegotiationHandler {
   ~NegotiationHandler() {}
 };
 
-/// Told how an asynchronous operation that yields a token ended: with the token and a null exception, or with an empty
-/// pointer and the exception, which is valid during the call only (keep a copy by `Clone`, raise it by `Throw`).
-typedef boost::function<void(const boost::shared_ptr<const SamlToken>&, const Pelmar::Exception*)> TokenCompletion;
+/// Told how an asynchronous operation that yields a token ended: with the token and a null exception, or with
+/// an empty pointer and the exception, which is valid during the call only (keep a copy by `Clone`, raise it
+/// by `Throw`).
+typedef boost::function<void(const boost::shared_ptr<const SamlToken>&, const Pelmar::Exception*)>
+    TokenCompletion;
 
-/// Told how an asynchronous validation ended: with the verdict and a null exception, or with an empty optional and the exception.
+/// Told how an asynchronous validation ended: with the verdict and a null exception, or with an empty
+/// optional and the exception.
 typedef boost::function<void(const boost::optional<bool>&, const Pelmar::Exception*)> ValidationCompletion;
 
 /// A token service.
 ///
-/// Threads: immutable; any number of threads may call one object at once. Each call opens its own HTTP session.
-/// Blocking operations run on the caller's thread. Asynchronous ones copy what they need, return at once and complete on a platform
-/// thread, perhaps before they have returned; the caller may release the service and the arguments right away.
+/// Threads: immutable; any number of threads may call one object at once. Each call opens its own HTTP
+/// session. Blocking operations run on the caller's thread. Asynchronous ones copy what they need, return at
+/// once and complete on a platform thread, perhaps before they have returned; the caller may release the
+/// service and the arguments right away.
 ///
 /// Errors of every operation that returns a token:
-/// - Pelmar::InvalidArgumentException, Pelmar::InvalidStateException: a bad argument, found before anything is sent;
-/// - CommunicationException: the service cannot be reached, does not answer within four minutes, or answers with an error status;
+/// - Pelmar::InvalidArgumentException, Pelmar::InvalidStateException: a bad argument, found before
+///   anything is sent;
+/// - CommunicationException: the service cannot be reached, does not answer within four minutes, or answers
+///   with an error status;
 /// - InvalidCredentialsException: the service rejected the credentials;
-/// - InvalidSignatureException: the returned token's signature does not verify against the trusted certificates;
-/// - SsoException: any other fault, an unusable answer, or a returned token that does not parse or is not valid now.
+/// - InvalidSignatureException: the returned token's signature does not verify against the trusted
+///   certificates;
+/// - SsoException: any other fault, an unusable answer, or a returned token that does not parse or is not
+///   valid now;
+/// - other Pelmar::Exceptions, unchanged, where CreateSamlToken or the platform raise them.
 class QUORLIN_API SecurityTokenService {
  public:
   /// A token for a user who proves to be one by a password. The password travels in the message: use https:.
-  virtual boost::shared_ptr<const SamlToken> AcquireToken(const std::string& userName, const std::string& password,
+  virtual boost::shared_ptr<const SamlToken> AcquireToken(const std::string& userName,
+                                                          const std::string& password,
                                                           const TokenSpec& spec) const = 0;
   /// A token for the principal as whom `handler` negotiates.
   virtual boost::shared_ptr<const SamlToken> AcquireTokenByGSS(const TokenSpec& spec,
                                                                NegotiationHandler& handler) const = 0;
-  /// A holder-of-key token for the principal that the configured certificate belongs to. Needs a HolderOfKeyConfig.
+  /// A holder-of-key token for the principal that the configured certificate belongs to. Needs a
+  /// HolderOfKeyConfig.
   virtual boost::shared_ptr<const SamlToken> AcquireTokenByCertificate(const TokenSpec& spec) const = 0;
   /// A new token in exchange for `token`, on which it acts. Needs a HolderOfKeyConfig.
   virtual boost::shared_ptr<const SamlToken> AcquireTokenByToken(const SamlToken& token,
                                                                  const TokenSpec& spec) const = 0;
   /// Whether the service still knows the token's subject as a valid principal.
   virtual bool ValidateSubject(const SamlToken& token) const = 0;
-  /// The holder-of-key token `token` with a new lifetime of `lifetimeSec` seconds from now. Needs a HolderOfKeyConfig.
-  virtual boost::shared_ptr<const SamlToken> RenewToken(const SamlToken& token, long long lifetimeSec) const = 0;
+  /// The holder-of-key token `token` with a new lifetime of `lifetimeSec` seconds from now. Needs a
+  /// HolderOfKeyConfig.
+  virtual boost::shared_ptr<const SamlToken> RenewToken(const SamlToken& token,
+                                                        long long lifetimeSec) const = 0;
 
-  virtual void AcquireTokenAsync(const std::string& userName, const std::string& password, const TokenSpec& spec,
-                                 const TokenCompletion& done) const = 0;
-  virtual void AcquireTokenByGssAsync(const TokenSpec& spec, const boost::shared_ptr<NegotiationHandler>& handler,
+  virtual void AcquireTokenAsync(const std::string& userName, const std::string& password,
+                                 const TokenSpec& spec, const TokenCompletion& done) const = 0;
+  virtual void AcquireTokenByGssAsync(const TokenSpec& spec,
+                                      const boost::shared_ptr<NegotiationHandler>& handler,
                                       const TokenCompletion& done) const = 0;
   virtual void AcquireTokenByCertificateAsync(const TokenSpec& spec, const TokenCompletion& done) const = 0;
-  virtual void AcquireTokenByTokenAsync(const boost::shared_ptr<const SamlToken>& token, const TokenSpec& spec,
-                                        const TokenCompletion& done) const = 0;
+  virtual void AcquireTokenByTokenAsync(const boost::shared_ptr<const SamlToken>& token,
+                                        const TokenSpec& spec, const TokenCompletion& done) const = 0;
   virtual void ValidateSubjectAsync(const boost::shared_ptr<const SamlToken>& token,
                                     const ValidationCompletion& done) const = 0;
   virtual void RenewTokenAsync(const boost::shared_ptr<const SamlToken>& token, long long lifetimeSec,
@@ -98,9 +113,11 @@ class QUORLIN_API SecurityTokenService {
   ~SecurityTokenService() {}
 };
 
-/// A client of the service that `config` describes. Nothing is sent yet. Throws Pelmar::InvalidArgumentException for an https: URL without an SSL
-/// context or a bad connection parameter, and Pelmar::Http::HttpException for a malformed URL.
-QUORLIN_API boost::shared_ptr<SecurityTokenService> CreateSecurityTokenService(const SecurityTokenServiceConfig& config);
+/// A client of the service that `config` describes. Nothing is sent yet. Throws
+/// Pelmar::InvalidArgumentException for an https: URL without an SSL context or a bad connection parameter,
+/// and Pelmar::Http::HttpException for a malformed URL.
+QUORLIN_API boost::shared_ptr<SecurityTokenService> CreateSecurityTokenService(
+    const SecurityTokenServiceConfig& config);
 
 }  // namespace Quorlin
 

@@ -19,14 +19,15 @@
 
 namespace Quorlin {
 
-/// The client's signing identity: requests are signed with the key, and holder-of-key tokens are bound to the certificate.
+/// The client's signing identity: requests are signed with the key, and holder-of-key tokens are bound to the
+/// certificate.
 struct HolderOfKeyConfig {
   Pelmar::Ref<const Pelmar::Crypto::PrivateKey> privateKey;
   Pelmar::Ref<const Pelmar::Crypto::Certificate> certificate;  ///< That of `privateKey`.
 };
 
-/// What CreateSecurityTokenService needs. It is read once and not kept. Nothing else configures the library: it reads no file,
-/// environment variable or registry.
+/// What CreateSecurityTokenService needs. It is read once and not kept. Nothing else configures the library:
+/// it reads no file, environment variable or registry.
 struct QUORLIN_API SecurityTokenServiceConfig {
   SecurityTokenServiceConfig();
   ~SecurityTokenServiceConfig();
@@ -34,8 +35,9 @@ struct QUORLIN_API SecurityTokenServiceConfig {
   SecurityTokenServiceConfig& operator=(const SecurityTokenServiceConfig& other);
 
   std::string stsUrl;  ///< The service's endpoint, http: or https:.
-  /// Certificates that the tokens' signatures must chain to. Null entries are skipped. When the list is empty, every token is refused.
-  std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate> > trustedStsCertificates;
+  /// Certificates that the tokens' signatures must chain to. Null entries are skipped. When the list is
+  /// empty, every token is refused.
+  std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> trustedStsCertificates;
   /// Empty, or public-key pins "sha256//<base64>" joined by ";" that the TLS server's key must match.
   std::string sslConnectionParam;
   /// Absent for a client that only handles bearer tokens.

@@ -44,8 +44,9 @@ PELMAR_API Ref<const Certificate> CreateCertificateFromDer(const std::vector<uns
 /// The first certificate of a PEM text. Throws CryptoException.
 PELMAR_API Ref<const Certificate> CreateCertificateFromPem(const std::string& pem);
 
-/// All certificates of a PEM text, in order; at least one. Text between them and other PEM objects are skipped. Throws CryptoException.
-PELMAR_API std::list<Ref<const Certificate> > CreateCertificatesFromPem(const std::string& pem);
+/// All certificates of a PEM text, in order; at least one. Text between them and other PEM objects are
+/// skipped. Throws CryptoException.
+PELMAR_API std::list<Ref<const Certificate>> CreateCertificatesFromPem(const std::string& pem);
 
 }  // namespace Crypto
 }  // namespace Pelmar

@@ -14,7 +14,8 @@
 namespace Pelmar {
 namespace Crypto {
 
-/// A key, certificate or cryptographic operation failed. The message says what, never with key material in it.
+/// A key, certificate or cryptographic operation failed. The message says what, never with key material in
+/// it.
 class PELMAR_API CryptoException : public Exception {
  public:
   explicit CryptoException(const std::string& message);

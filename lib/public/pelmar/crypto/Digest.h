@@ -18,7 +18,8 @@ namespace Crypto {
 enum DigestAlgorithm { DIGEST_SHA256, DIGEST_SHA384, DIGEST_SHA512 };
 
 /// The digest of `size` bytes at `data` (FIPS 180-4): 32, 48 or 64 bytes. Throws CryptoException.
-PELMAR_API std::vector<unsigned char> ComputeDigest(DigestAlgorithm algorithm, const void* data, std::size_t size);
+PELMAR_API std::vector<unsigned char> ComputeDigest(DigestAlgorithm algorithm, const void* data,
+                                                    std::size_t size);
 
 /// Bytes as lower-case hexadecimal text.
 PELMAR_API std::string ToHex(const std::vector<unsigned char>& bytes);

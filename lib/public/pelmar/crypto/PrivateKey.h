@@ -24,22 +24,25 @@ enum KeyType { KEY_RSA, KEY_EC };
 class PELMAR_API PrivateKey : public Object {
  public:
   virtual KeyType GetType() const = 0;
-  /// Signs `size` bytes at `data`: RSASSA-PKCS1-v1_5 (RFC 8017) for RSA; for EC the ECDSA value as r and s, each of the length of the
-  /// curve's order, one after the other (XML Signature 1.1, section 6.4.3). Throws CryptoException.
-  virtual std::vector<unsigned char> Sign(DigestAlgorithm digest, const void* data, std::size_t size) const = 0;
+  /// Signs `size` bytes at `data`: RSASSA-PKCS1-v1_5 (RFC 8017) for RSA; for EC the ECDSA value as r and s,
+  /// each of the length of the curve's order, one after the other (XML Signature 1.1, section 6.4.3). Throws
+  /// CryptoException.
+  virtual std::vector<unsigned char> Sign(DigestAlgorithm digest, const void* data,
+                                          std::size_t size) const = 0;
 
  protected:
   PrivateKey();
   ~PrivateKey() override;
 };
 
-/// An unencrypted RSA (at least 2048 bits) or EC (P-256, P-384, P-521) key from PEM text: PKCS #8, or the traditional forms.
-/// Throws CryptoException, also when the key is encrypted.
+/// An unencrypted RSA (at least 2048 bits) or EC (P-256, P-384, P-521) key from PEM text: PKCS #8, or the
+/// traditional forms. Throws CryptoException, also when the key is encrypted.
 PELMAR_API Ref<const PrivateKey> CreatePrivateKeyFromPem(const std::string& pem);
 
-/// The same for a key that may be encrypted (PKCS #8 EncryptedPrivateKeyInfo, or a traditional form) with `passPhrase`. A wrong pass
-/// phrase is a CryptoException. Nothing is ever asked for on a terminal.
-PELMAR_API Ref<const PrivateKey> CreatePrivateKeyFromPem(const std::string& pem, const std::string& passPhrase);
+/// The same for a key that may be encrypted (PKCS #8 EncryptedPrivateKeyInfo, or a traditional form) with
+/// `passPhrase`. A wrong pass phrase is a CryptoException. Nothing is ever asked for on a terminal.
+PELMAR_API Ref<const PrivateKey> CreatePrivateKeyFromPem(const std::string& pem,
+                                                         const std::string& passPhrase);
 
 /// From DER: PKCS #8 or the traditional forms, unencrypted.
 PELMAR_API Ref<const PrivateKey> CreatePrivateKeyFromDer(const std::vector<unsigned char>& der);

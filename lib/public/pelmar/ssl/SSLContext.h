@@ -18,33 +18,38 @@
 namespace Pelmar {
 namespace Ssl {
 
-/// Trust anchors and, if wanted, a client identity for TLS connections. Immutable; shared by connections and threads.
+/// Trust anchors and, if wanted, a client identity for TLS connections. Immutable; shared by connections and
+/// threads.
 ///
-/// Servers are always verified: the chain up to one of the anchors, the validity periods, and the host name (RFC 6125). The protocol is TLS 1.2
-/// or newer. Nothing is read from the environment. There is no way to switch any of this off.
+/// Servers are always verified: the chain up to one of the anchors, the validity periods, and the host name
+/// (RFC 6125). The protocol is TLS 1.2 or newer. Nothing is read from the environment. There is no way to
+/// switch any of this off.
 class PELMAR_API SSLContext : public Object {
  protected:
   SSLContext();
   ~SSLContext() override;
 };
 
-/// Where an SSL context takes its trust anchors and its client identity from. All anchors given are trusted together.
+/// Where an SSL context takes its trust anchors and its client identity from. All anchors given are trusted
+/// together.
 struct PELMAR_API SSLContextOptions {
   SSLContextOptions();
   ~SSLContextOptions();
 
-  std::list<Ref<const Crypto::Certificate> > trustAnchors;  ///< Null entries are skipped.
-  std::string caFile;                                        ///< A PEM bundle to read; empty: none.
-  std::string caDirectory;                                   ///< A directory of hashed certificates to look anchors up in; empty: none.
-  bool useSystemStore;                                       ///< Trust what the operating system trusts. Default: no.
+  std::list<Ref<const Crypto::Certificate>> trustAnchors;  ///< Null entries are skipped.
+  std::string caFile;                                      ///< A PEM bundle to read; empty: none.
+  std::string caDirectory;  ///< A directory of hashed certificates to look anchors up in; empty: none.
+  bool useSystemStore;      ///< Trust what the operating system trusts. Default: no.
 
-  Ref<const Crypto::PrivateKey> clientKey;                                ///< Null: the client shows no certificate.
-  Ref<const Crypto::Certificate> clientCertificate;                       ///< That of `clientKey`.
-  std::list<Ref<const Crypto::Certificate> > clientCertificateChain;  ///< Intermediates sent with it, nearest issuer first.
+  Ref<const Crypto::PrivateKey> clientKey;           ///< Null: the client shows no certificate.
+  Ref<const Crypto::Certificate> clientCertificate;  ///< That of `clientKey`.
+  std::list<Ref<const Crypto::Certificate>>
+      clientCertificateChain;  ///< Intermediates sent with it, nearest issuer first.
 };
 
-/// Reads and parses all anchors once. Throws CryptoException when a file cannot be read or holds no certificate, when the key does
-/// not belong to the certificate; InvalidArgumentException when only one of key and certificate is given.
+/// Reads and parses all anchors once. Throws CryptoException when a file cannot be read or holds no
+/// certificate, when the key does not belong to the certificate; InvalidArgumentException when only one of
+/// key and certificate is given.
 PELMAR_API Ref<SSLContext> CreateSSLContext(const SSLContextOptions& options);
 
 }  // namespace Ssl

@@ -28,8 +28,9 @@ enum NodeKind { DOCUMENT_NODE, ELEMENT_NODE, TEXT_NODE, COMMENT_NODE, PROCESSING
 /// A node of a document tree.
 ///
 /// Ownership: a parent owns its children; whoever holds a `Ref` to a node keeps that node and all below it
-/// alive, but not what is above: when the parent dies, the node has no parent any more. Threads: a tree that
-/// nobody changes may be read from several threads; a changing one belongs to one thread.
+/// alive, but not what is above: when the parent dies, the node has no parent any more.
+///
+/// Threads: a tree that nobody changes may be read from several threads; a changing one belongs to one thread.
 class PELMAR_API Node : public Object {
  public:
   NodeKind GetKind() const noexcept { return _kind; }

@@ -42,7 +42,7 @@ enum ParserLimit : std::size_t {
   kMaxDocumentBytes = 16 * 1024 * 1024,
   /// Elements, attributes, comments and processing instructions together: a tree of nothing but "<a/>" would
   /// take fifty times the memory of its text.
-  kMaxNodes = 1024 * 1024,
+  kMaxNodes = 256 * 1024,
   kMaxElementDepth = 256,
   kMaxAttributesPerElement = 256,
   kMaxNamespaceDeclarationsInScope = 256

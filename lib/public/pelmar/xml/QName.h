@@ -13,7 +13,8 @@
 namespace Pelmar {
 namespace Xml {
 
-/// An expanded name (Namespaces in XML 1.0, section 2.1): namespace URI (empty: none) and local name. A plain value.
+/// An expanded name (Namespaces in XML 1.0, section 2.1): namespace URI (empty: none) and local name. A plain
+/// value.
 class PELMAR_API QName {
  public:
   QName();

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// The algorithm identifiers of XML Signature that the platform knows. There are no others: the list is closed.
+// The algorithm identifiers of XML Signature that the platform knows. There are no others: the list is
+// closed.
 
 #ifndef PELMAR_XML_SECURITY_ALGORITHMS_H
 #define PELMAR_XML_SECURITY_ALGORITHMS_H
@@ -13,7 +14,8 @@ namespace Security {
 /// XML Signature's own namespace.
 constexpr const char* kSignatureNamespace = "http://www.w3.org/2000/09/xmldsig#";
 
-/// Canonical XML 1.0. The API and the wire know it with and without the final "#"; signatures made here are written without.
+/// Canonical XML 1.0. The API and the wire know it with and without the final "#"; signatures made here are
+/// written without.
 constexpr const char* kC14n = "http://www.w3.org/TR/2001/REC-xml-c14n-20010315#";
 constexpr const char* kC14nWithComments = "http://www.w3.org/TR/2001/REC-xml-c14n-20010315#WithComments";
 /// Exclusive XML Canonicalization 1.0.

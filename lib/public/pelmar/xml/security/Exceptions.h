@@ -15,7 +15,8 @@ namespace Pelmar {
 namespace Xml {
 namespace Security {
 
-/// A signature cannot be judged or made: unknown algorithm, no acceptable key, an untrusted chain, a canonicalisation failure.
+/// A signature cannot be judged or made: unknown algorithm, no acceptable key, an untrusted chain, a
+/// canonicalisation failure.
 class PELMAR_API XmlSecurityException : public Exception {
  public:
   explicit XmlSecurityException(const std::string& message);
@@ -25,7 +26,8 @@ class PELMAR_API XmlSecurityException : public Exception {
   [[noreturn]] void Throw() const override;
 };
 
-/// A ds:Signature element does not have the structure of XML Signature 1.1, section 4, as far as this platform accepts it.
+/// A ds:Signature element does not have the structure of XML Signature 1.1, section 4, as far as this
+/// platform accepts it.
 class PELMAR_API SignatureSyntaxException : public XmlSecurityException {
  public:
   explicit SignatureSyntaxException(const std::string& message);
