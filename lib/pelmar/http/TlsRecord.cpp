@@ -250,6 +250,8 @@ TlsFailureReason FindTlsFailureReason(const std::string& engineText) {
   if (ERR_GET_LIB(code) == ERR_LIB_SSL) {
     reason.kind = ClassifyReason(ERR_GET_REASON(code));
   }
+  // The texts are loaded with the first connection, which is not a given here.
+  OPENSSL_init_ssl(OPENSSL_INIT_LOAD_SSL_STRINGS, nullptr);
   const char* const text = ERR_reason_error_string(code);
   reason.text = text == nullptr ? "" : text;
   return reason;
