@@ -10,14 +10,17 @@ namespace Xml {
 
 namespace {
 
+// For each byte 0 or 1.
+using Marks = std::array<unsigned char, 256>;
+
 // What stands for a byte. Those that stand for themselves have no text, and no mark.
 struct Escapes {
   std::array<std::string_view, 256> texts = {};
-  std::array<bool, 256> marks = {};
+  Marks marks = {};
 
   constexpr void Add(char byte, std::string_view text) noexcept {
     texts[static_cast<unsigned char>(byte)] = text;
-    marks[static_cast<unsigned char>(byte)] = true;
+    marks[static_cast<unsigned char>(byte)] = 1;
   }
 };
 
@@ -49,7 +52,7 @@ constexpr Escapes kAttributeEscapes = MakeAttributeEscapes();
 // The number of bytes before the first one that is escaped. All text that is written or digested passes here,
 // so it goes by fours, with one jump for four bytes, and by look-up only: which bytes are letters and which
 // are not, no processor can predict.
-std::size_t CountPlain(std::string_view text, const std::array<bool, 256>& marks) noexcept {
+std::size_t CountPlain(std::string_view text, const Marks& marks) noexcept {
   const auto* const bytes = reinterpret_cast<const unsigned char*>(text.data());
   std::size_t count = 0;
   for (; text.size() - count >= 4; count += 4) {
@@ -58,7 +61,7 @@ std::size_t CountPlain(std::string_view text, const std::array<bool, 256>& marks
       break;
     }
   }
-  while (count < text.size() && !marks[bytes[count]]) {
+  while (count < text.size() && marks[bytes[count]] == 0) {
     ++count;
   }
   return count;

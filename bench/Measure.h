@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// Times pieces of work beside the work that nobody could do without, in one run.
+
+#ifndef QUORLIN_BENCH_MEASURE_H
+#define QUORLIN_BENCH_MEASURE_H
+
+#include <cstddef>
+#include <functional>
+#include <string>
+#include <vector>
+
+namespace Bench {
+
+using Action = std::function<void()>;
+
+/// One line of the table: a piece of work and what it is measured against.
+struct Row {
+  std::string name;
+  std::size_t bytes;  ///< Of the text that is read or made.
+  Action subject;
+  Action floor;
+  double limit;                ///< The largest ratio of the subject to its floor that `--check` lets pass.
+  double aim = 0;              ///< The ratio we work for; 0: none.
+  double aimMicroseconds = 0;  ///< The time we work for, on a machine of today; 0: none. Never checked.
+};
+
+/// Medians over all rounds. The ratio is the median of the rounds' ratios, so that a machine that changes its
+/// speed in the middle changes both sides of it.
+struct Result {
+  double subjectMicroseconds;
+  double floorMicroseconds;
+  double ratio;
+};
+
+/// One result for each row. Every round goes through all rows and takes the subject and its floor right after
+/// each other. What is counted is the processor time of this thread, so that other work on the machine does
+/// not count.
+std::vector<Result> MeasureInterleaved(const std::vector<Row>& rows, std::size_t rounds);
+
+}  // namespace Bench
+
+#endif  // QUORLIN_BENCH_MEASURE_H

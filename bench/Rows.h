@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// The lines of the table.
+
+#ifndef QUORLIN_BENCH_ROWS_H
+#define QUORLIN_BENCH_ROWS_H
+
+#include "bench/Measure.h"
+
+#include <string>
+#include <vector>
+
+namespace Bench {
+
+/// Lines that belong together.
+struct Section {
+  std::string title;
+  std::vector<Row> rows;
+};
+
+/// The first three rows are the small, the medium and the large token.
+Section MakeValidationSection();
+/// The same tokens through the single steps of validation.
+Section MakeStepsSection();
+Section MakeSignedRequestsSection();
+Section MakeUnsignedRequestsSection();
+
+}  // namespace Bench
+
+#endif  // QUORLIN_BENCH_ROWS_H
