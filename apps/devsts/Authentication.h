@@ -33,15 +33,33 @@ struct Caller {
   std::string proofSignatureId;
   /// Through whom the identity came here already.
   std::vector<DelegateLink> delegates;
-  unsigned proxyCount = 0;     ///< How often the identity may be handed on.
-  long long notOnOrAfter = 0;  ///< When what the caller presented ends; 0: no bound.
+  unsigned proxyCount = 0;            ///< How often the identity may be handed on.
+  unsigned renewCount = 0;            ///< How often a token for it may be renewed.
+  std::vector<std::string> audience;  ///< Whom the new token may be for at most; empty: anybody.
+  long long notOnOrAfter = 0;         ///< When what the caller presented ends; 0: no bound.
 };
 
-/// Authenticates the sender of a message that carries its own proof: a UsernameToken with the right password,
-/// or a signature made with a key whose certificate the message carries and the directory knows. With both,
-/// the password says who it is and the signature proves the key. Throws Fault.
-Caller Authenticate(const SoapMessage& message, const SecurityHeader& header, const Directory& directory,
-                    ReplayGuard& replays, long long now, RequestRecord& record);
+/// What a sender is judged by.
+struct AuthenticationContext {
+  const Directory& directory;
+  /// That of the service itself, which signed the tokens that are presented to it.
+  Pelmar::Ref<const Pelmar::Crypto::Certificate> tokenSigner;
+  ReplayGuard& replays;
+  long long now;  ///< Microseconds since the epoch.
+  RequestRecord& record;
+};
+
+/// Authenticates the sender of a message by what its header carries: a token of this service (with a
+/// signature by the key that it is bound to, if any); a UsernameToken with the right password; or a signature
+/// made with a key whose certificate the message carries and the directory knows. With password and
+/// signature, the password says who it is and the signature proves the key. Throws Fault.
+Caller Authenticate(const SoapMessage& message, const SecurityHeader& header,
+                    const AuthenticationContext& context);
+
+/// Checks that the message is signed with the key of the certificate it carries, and that it is no copy of an
+/// earlier one. This proves that the sender holds the key, not who the sender is. Throws Fault.
+void RequireProofOfKey(const SoapMessage& message, const SecurityHeader& header,
+                       const AuthenticationContext& context);
 
 }  // namespace DevSts
 

@@ -12,9 +12,6 @@ namespace DevSts {
 
 namespace {
 
-/// How often a renewable token may be renewed.
-constexpr unsigned kRenewCount = 10;
-
 /// Readers of tokens take blank text for no text.
 void RequireNotBlank(const std::string& text, const char* what) {
   if (text.find_first_not_of("\t\n\r ") == std::string::npos) {
@@ -50,15 +47,23 @@ void GrantUser(const User& user, AssertionContent& content) {
   content.solution = user.solution;
 }
 
-void GrantLifetime(const Caller& caller, const TokenRequest& request, const LifetimeLimits& limits,
-                   long long now, AssertionContent& content) {
+void GrantLifetime(const TokenRequest& request, const LifetimeLimits& limits, long long now,
+                   AssertionContent& content) {
   const long long wanted =
       request.lifetime != 0 ? request.lifetime : limits.defaultSec * kMicrosecondsPerSecond;
   content.issued = now;
   content.notBefore = now;
   content.notOnOrAfter = now + std::min(wanted, limits.maxSec * kMicrosecondsPerSecond);
-  if (caller.notOnOrAfter != 0) {
-    content.notOnOrAfter = std::min(content.notOnOrAfter, caller.notOnOrAfter);
+}
+
+/// A token that was for some services only is not exchanged for one that others accept.
+void GrantAudience(const Caller& caller, const TokenRequest& request, AssertionContent& content) {
+  content.audience = request.audience.empty() ? caller.audience : request.audience;
+  for (const std::string& address : content.audience) {
+    const auto end = caller.audience.end();
+    if (!caller.audience.empty() && std::find(caller.audience.begin(), end, address) == end) {
+      throw Fault(FaultCode::REQUEST_FAILED, "The audience is wider than that of the presented token");
+    }
   }
 }
 
@@ -103,14 +108,29 @@ AssertionContent Grant(const Caller& caller, const TokenRequest& request, const 
   RequireUsableTexts(request);
   AssertionContent content;
   GrantUser(*caller.user, content);
-  GrantLifetime(caller, request, limits, now, content);
+  GrantLifetime(request, limits, now, content);
+  if (caller.notOnOrAfter != 0) {
+    content.notOnOrAfter = std::min(content.notOnOrAfter, caller.notOnOrAfter);
+  }
+  GrantAudience(caller, request, content);
   GrantDelegation(caller, request, directory, now, content);
   GrantConfirmation(caller, request, content);
   content.authenticated = caller.authenticated;
   content.authnContext = caller.authnContext;
-  content.renewCount = request.renewable ? kRenewCount : 0;
-  content.audience = request.audience;
+  content.renewCount = request.renewable ? caller.renewCount : 0;
   content.advice = request.advice;
+  return content;
+}
+
+AssertionContent GrantRenewal(AssertionContent content, const User& user, const TokenRequest& request,
+                              const LifetimeLimits& limits, long long now) {
+  if (content.renewCount == 0) {
+    throw Fault(FaultCode::REQUEST_FAILED, "The token may not be renewed");
+  }
+  content.renewCount -= 1;
+  content.groups.clear();
+  GrantUser(user, content);
+  GrantLifetime(request, limits, now, content);
   return content;
 }
 

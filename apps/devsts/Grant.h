@@ -27,6 +27,11 @@ struct LifetimeLimits {
 AssertionContent Grant(const Caller& caller, const TokenRequest& request, const LifetimeLimits& limits,
                        const Directory& directory, long long now);
 
+/// `content` made valid from `now` for as long as `request` asks, with one renewal less to come and what the
+/// directory now knows of `user`. Throws Fault when it may not be renewed.
+AssertionContent GrantRenewal(AssertionContent content, const User& user, const TokenRequest& request,
+                              const LifetimeLimits& limits, long long now);
+
 }  // namespace DevSts
 
 #endif  // QUORLIN_DEVSTS_GRANT_H

@@ -4,6 +4,7 @@
 #include "devsts/RequestHandler.h"
 
 #include "devsts/Fault.h"
+#include "devsts/PresentedToken.h"
 #include "devsts/Responses.h"
 #include "devsts/SecurityHeader.h"
 #include "devsts/SoapMessage.h"
@@ -35,11 +36,35 @@ Answer MakeFaultAnswer(FaultCode code, const std::string& text, const std::strin
   return {500, kXmlContentType, MakeFault(code, text)};
 }
 
+/// The token that the request is about.
+AssertionContent ReadTarget(const TokenRequest& request, const AuthenticationContext& context) {
+  try {
+    const AssertionContent content = ReadPresentedToken(*request.target, context.tokenSigner, context.now);
+    context.record.AddPassed("token");
+    return content;
+  } catch (const TokenException& e) {
+    throw Fault(FaultCode::INVALID_TOKEN, e.what());
+  }
+}
+
+const User& GetSubject(const AssertionContent& content, const AuthenticationContext& context) {
+  const User* const user = context.directory.FindByName(content.upn);
+  if (user == nullptr) {
+    throw Fault(FaultCode::INVALID_TOKEN, "The token's subject is not known");
+  }
+  context.record.SetUser(user->GetUpn());
+  return *user;
+}
+
 }  // namespace
 
 RequestHandler::RequestHandler(const HandlerOptions& options, const Directory& directory,
                                const TokenIssuer& issuer, const Clock& clock, const LogSink& log)
-    : _options(options), _directory(directory), _issuer(issuer), _clock(clock), _log(log) {}
+    : _options(options),
+      _directory(std::make_shared<const Directory>(directory)),
+      _issuer(issuer),
+      _clock(clock),
+      _log(log) {}
 
 Answer RequestHandler::HandleRequest(const std::string& soapAction, const std::string& contentType,
                                      const std::string& body) {
@@ -75,24 +100,66 @@ std::string RequestHandler::Process(const std::string& soapAction, const std::st
   record.SetOperation(GetName(operation));
   const SoapMessage message = ReadSoapMessage(body);
   const SecurityHeader header = ReadSecurityHeader(*message.security);
-  RequireFresh(header, _clock(), _options.maxClockSkewSec * kMicrosecondsPerSecond);
+  const long long now = _clock();
+  RequireFresh(header, now, _options.maxClockSkewSec * kMicrosecondsPerSecond);
   record.AddPassed("timestamp");
   const TokenRequest request = ReadTokenRequest(*message.request, operation);
-  if (operation != Operation::ISSUE || request.binaryExchange) {
-    throw Fault(FaultCode::REQUEST_FAILED, "The operation is not supported");
+  if (request.binaryExchange) {
+    throw Fault(FaultCode::REQUEST_FAILED, "Negotiation is not supported");
   }
-  return Issue(message, header, request, record);
+  const std::shared_ptr<const Directory> directory = GetDirectory();
+  const AuthenticationContext context = {*directory, _issuer.GetCertificate(), _replays, now, record};
+  switch (operation) {
+    case Operation::RENEW:
+      return Renew(message, header, request, context);
+    case Operation::VALIDATE:
+      return Validate(request, context);
+    default:
+      return Issue(message, header, request, context);
+  }
 }
 
 std::string RequestHandler::Issue(const SoapMessage& message, const SecurityHeader& header,
-                                  const TokenRequest& request, RequestRecord& record) {
-  if (header.assertion != nullptr) {
-    throw Fault(FaultCode::REQUEST_FAILED, "Tokens are not exchanged");
-  }
-  const long long now = _clock();
-  const Caller caller = Authenticate(message, header, _directory, _replays, now, record);
-  const AssertionContent content = Grant(caller, request, _options.lifetime, _directory, now);
+                                  const TokenRequest& request, const AuthenticationContext& context) {
+  const Caller caller = Authenticate(message, header, context);
+  const AssertionContent content = Grant(caller, request, _options.lifetime, context.directory, context.now);
   return MakeIssueResponse({_issuer.Issue(content), content.notBefore, content.notOnOrAfter});
+}
+
+/// Whoever holds the key that the token is bound to may renew it.
+std::string RequestHandler::Renew(const SoapMessage& message, const SecurityHeader& header,
+                                  const TokenRequest& request, const AuthenticationContext& context) {
+  RequireProofOfKey(message, header, context);
+  const AssertionContent content = ReadTarget(request, context);
+  const User& user = GetSubject(content, context);
+  if (!content.confirmationCertificate ||
+      content.confirmationCertificate->GetDer() != header.certificate->GetDer()) {
+    throw Fault(FaultCode::INVALID_TOKEN, "The token is not bound to the key that signed the message");
+  }
+  const AssertionContent renewed = GrantRenewal(content, user, request, _options.lifetime, context.now);
+  return MakeRenewResponse({_issuer.Issue(renewed), renewed.notBefore, renewed.notOnOrAfter});
+}
+
+/// Answers whether the subject is one that the service still knows, by a token of its own. Anybody may ask.
+std::string RequestHandler::Validate(const TokenRequest& request, const AuthenticationContext& context) {
+  try {
+    GetSubject(ReadTarget(request, context), context);
+    return MakeValidateResponse(true);
+  } catch (const Fault& fault) {
+    context.record.AddFailed(fault.what());
+    return MakeValidateResponse(false);
+  }
+}
+
+void RequestHandler::SetDirectory(const Directory& directory) {
+  const std::shared_ptr<const Directory> next = std::make_shared<const Directory>(directory);
+  const std::lock_guard<std::mutex> lock(_mutex);
+  _directory = next;
+}
+
+std::shared_ptr<const Directory> RequestHandler::GetDirectory() const {
+  const std::lock_guard<std::mutex> lock(_mutex);
+  return _directory;
 }
 
 }  // namespace DevSts

@@ -14,6 +14,8 @@
 #include "devsts/TokenIssuer.h"
 #include "devsts/TokenRequest.h"
 
+#include <memory>
+#include <mutex>
 #include <string>
 
 namespace DevSts {
@@ -44,15 +46,23 @@ class RequestHandler final {
   Answer HandleRequest(const std::string& soapAction, const std::string& contentType,
                        const std::string& body);
 
+  /// From the next request on the service knows these users.
+  void SetDirectory(const Directory& directory);
+
  private:
+  std::shared_ptr<const Directory> GetDirectory() const;
   Answer Respond(const std::string& soapAction, const std::string& contentType, const std::string& body,
                  RequestRecord& record);
   std::string Process(const std::string& soapAction, const std::string& body, RequestRecord& record);
   std::string Issue(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
-                    RequestRecord& record);
+                    const AuthenticationContext& context);
+  std::string Renew(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
+                    const AuthenticationContext& context);
+  std::string Validate(const TokenRequest& request, const AuthenticationContext& context);
 
   HandlerOptions _options;
-  Directory _directory;
+  mutable std::mutex _mutex;
+  std::shared_ptr<const Directory> _directory;  // Guarded by the mutex; what it points to never changes.
   TokenIssuer _issuer;
   Clock _clock;
   LogSink _log;

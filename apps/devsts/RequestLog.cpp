@@ -21,6 +21,9 @@ std::string RequestRecord::ToJson(long long now) const {
   line["operation"] = _operation.empty() ? nlohmann::ordered_json() : nlohmann::ordered_json(_operation);
   line["user"] = _user.empty() ? nlohmann::ordered_json() : nlohmann::ordered_json(_user);
   line["passed"] = _passed;
+  if (!_failed.empty()) {
+    line["failed"] = _failed;
+  }
   line["status"] = _status;
   if (!_fault.empty()) {
     line["fault"] = _fault;

@@ -26,6 +26,8 @@ class RequestRecord final {
   void SetUser(const std::string& upn) { _user = upn; }
   /// A check that passed.
   void AddPassed(const std::string& check) { _passed.push_back(check); }
+  /// A check that failed without the request failing with it.
+  void AddFailed(const std::string& check) { _failed.push_back(check); }
   /// The answer; `fault` is empty for a granted request.
   void SetAnswer(int status, const std::string& fault, const std::string& reason);
 
@@ -35,6 +37,7 @@ class RequestRecord final {
   std::string _operation;
   std::string _user;
   std::vector<std::string> _passed;
+  std::vector<std::string> _failed;
   int _status = 0;
   std::string _fault;
   std::string _reason;

@@ -22,10 +22,17 @@ std::vector<std::string> GetServerNames(const ServiceConfig& config) {
   return names;
 }
 
-/// An IPv6 address stands in brackets (RFC 3986, section 3.2.2).
+/// An IPv6 address stands in brackets (RFC 3986, section 3.2.2). The addresses that stand for all of the
+/// machine's are none to connect to.
+std::string GetUrlHost(const std::string& address) {
+  if (address == "0.0.0.0" || address == "::") {
+    return "localhost";
+  }
+  return address.find(':') != std::string::npos ? "[" + address + "]" : address;
+}
+
 std::string MakeUrl(const ServiceConfig& config, std::uint16_t port) {
-  const bool isIpv6 = config.address.find(':') != std::string::npos;
-  const std::string host = isIpv6 ? "[" + config.address + "]" : config.address;
+  const std::string host = GetUrlHost(config.address);
   return (config.tls ? "https://" : "http://") + host + ":" + std::to_string(port) + kServicePath;
 }
 

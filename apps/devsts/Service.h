@@ -56,6 +56,10 @@ class Service final {
   /// once.
   void Stop();
 
+  /// From the next request on the service knows these users; tokens of others are no longer valid subjects to
+  /// it.
+  void SetDirectory(const Directory& directory) { _handler.SetDirectory(directory); }
+
   /// Where the service is reached: "https://127.0.0.1:41234/sts".
   const std::string& GetUrl() const { return _url; }
 

@@ -21,8 +21,12 @@ struct Command {
   std::function<int()> run;
 };
 
-/// acquire password
+/// acquire password, acquire certificate, acquire token
 std::vector<Command> AddAcquireCommands(CLI::App& app);
+/// renew
+Command AddRenewCommand(CLI::App& app);
+/// validate
+Command AddValidateCommand(CLI::App& app);
 /// verify
 Command AddVerifyCommand(CLI::App& app);
 /// sts

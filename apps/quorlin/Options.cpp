@@ -3,8 +3,10 @@
 
 #include "quorlin/Options.h"
 
+#include "quorlin/AdviceFile.h"
 #include "quorlin/Failure.h"
 #include "quorlin/Files.h"
+#include "quorlin/Password.h"
 
 #include <pelmar/StringUtil.h>
 #include <pelmar/crypto/CryptoException.h>
@@ -26,6 +28,19 @@ Pelmar::Ref<Pelmar::Ssl::SSLContext> MakeSslContext(const ServiceOptions& option
     return Pelmar::Ssl::CreateSSLContext(contextOptions);
   } catch (const Pelmar::Crypto::CryptoException& e) {
     throw UsageException(std::string("cannot set up TLS: ") + e.what());
+  }
+}
+
+Pelmar::Ref<const Pelmar::Crypto::PrivateKey> ReadKey(const HolderOfKeyOptions& options) {
+  const Secret pem(ReadFile(options.keyFile));
+  try {
+    if (options.keyPasswordFile.empty()) {
+      return Pelmar::Crypto::CreatePrivateKeyFromPem(pem.Reveal());
+    }
+    return Pelmar::Crypto::CreatePrivateKeyFromPem(pem.Reveal(),
+                                                   ReadSecretFile(options.keyPasswordFile).Reveal());
+  } catch (const Pelmar::Crypto::CryptoException& e) {
+    throw UsageException("cannot use the key in " + options.keyFile + ": " + e.what());
   }
 }
 
@@ -51,12 +66,32 @@ void AddServiceOptions(CLI::App& command, ServiceOptions& options) {
       ->type_name("PEM");
 }
 
-Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& options) {
+void AddHolderOfKeyOptions(CLI::App& command, HolderOfKeyOptions& options, bool required) {
+  CLI::Option* const certificate =
+      command.add_option("--cert", options.certificateFile, "Your certificate")->type_name("PEM");
+  CLI::Option* const key =
+      command.add_option("--key", options.keyFile, "Its private key, which signs the request")
+          ->type_name("PEM");
+  certificate->needs(key)->required(required);
+  key->needs(certificate)->required(required);
+  command.add_option("--key-password-file", options.keyPasswordFile, "The pass phrase of an encrypted --key")
+      ->needs(key)
+      ->type_name("FILE");
+}
+
+Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& options,
+                                                      const HolderOfKeyOptions& holderOfKey) {
   Quorlin::SecurityTokenServiceConfig config;
   config.stsUrl = options.url;
   config.trustedStsCertificates = ReadCertificates(options.stsCertificateFiles);
   if (!IsPlainHttp(options)) {
     config.sslContext = MakeSslContext(options);
+  }
+  if (!holderOfKey.keyFile.empty()) {
+    Quorlin::HolderOfKeyConfig identity;
+    identity.privateKey = ReadKey(holderOfKey);
+    identity.certificate = ReadCertificates({holderOfKey.certificateFile}).front();
+    config.holderOfKeyConfig = identity;
   }
   return config;
 }
@@ -65,10 +100,18 @@ bool IsPlainHttp(const ServiceOptions& options) {
   return HasScheme(options.url, "http:");
 }
 
-void AddTokenOptions(CLI::App& command, TokenOptions& options) {
+void AddLifetimeOption(CLI::App& command, TokenOptions& options) {
   command.add_option("--lifetime", options.lifetimeSec, "How long the token shall be valid, in seconds")
       ->type_name("SEC")
       ->capture_default_str();
+}
+
+void AddBearerOption(CLI::App& command, TokenOptions& options) {
+  command.add_flag("--bearer", options.bearer, "Ask for a token that is not bound to your key");
+}
+
+void AddTokenOptions(CLI::App& command, TokenOptions& options) {
+  AddLifetimeOption(command, options);
   command.add_flag("--renewable", options.renewable, "Ask for a token that can be renewed");
   command.add_flag("--delegable", options.delegable, "Ask for a token that can be delegated further");
   command
@@ -77,6 +120,10 @@ void AddTokenOptions(CLI::App& command, TokenOptions& options) {
   AddRepeatable(command, "--audience", options.audience,
                 "Restrict the token to this service. May be repeated")
       ->type_name("URI");
+  command
+      .add_option("--advice", options.adviceFile,
+                  "Ask for this advice in the token: JSON, as --json prints it")
+      ->type_name("FILE");
 }
 
 Quorlin::TokenSpec MakeTokenSpec(const TokenOptions& options) {
@@ -88,6 +135,12 @@ Quorlin::TokenSpec MakeTokenSpec(const TokenOptions& options) {
     spec.delegateTo = options.delegateTo;
   }
   spec.audienceRestriction.insert(options.audience.begin(), options.audience.end());
+  if (!options.adviceFile.empty()) {
+    spec.advice = ReadAdvice(options.adviceFile);
+  }
+  if (options.bearer) {
+    spec.confirmation = Quorlin::TokenSpec::CONFIRMATION_BEARER;
+  }
   return spec;
 }
 

@@ -25,9 +25,20 @@ struct ServiceOptions {
 
 void AddServiceOptions(CLI::App& command, ServiceOptions& options);
 
+/// The client's own key, to sign requests with and to bind tokens to.
+struct HolderOfKeyOptions {
+  std::string certificateFile;
+  std::string keyFile;
+  std::string keyPasswordFile;
+};
+
+/// Adds --cert, --key and --key-password-file. The first two are wanted together, or always when `required`.
+void AddHolderOfKeyOptions(CLI::App& command, HolderOfKeyOptions& options, bool required);
+
 /// Reads the files. An https: URL without --ca trusts what the operating system trusts. Throws
 /// UsageException.
-Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& options);
+Quorlin::SecurityTokenServiceConfig MakeServiceConfig(
+    const ServiceOptions& options, const HolderOfKeyOptions& holderOfKey = HolderOfKeyOptions());
 
 /// Whether what is sent can be read on the way.
 bool IsPlainHttp(const ServiceOptions& options);
@@ -39,9 +50,16 @@ struct TokenOptions {
   bool delegable = false;
   std::string delegateTo;
   std::vector<std::string> audience;
+  std::string adviceFile;
+  bool bearer = false;
 };
 
 void AddTokenOptions(CLI::App& command, TokenOptions& options);
+/// Adds --lifetime alone.
+void AddLifetimeOption(CLI::App& command, TokenOptions& options);
+/// Adds --bearer, for commands that would otherwise bind the token to the client's key.
+void AddBearerOption(CLI::App& command, TokenOptions& options);
+/// Reads the advice file. Throws UsageException.
 Quorlin::TokenSpec MakeTokenSpec(const TokenOptions& options);
 
 /// Where the outcome goes.

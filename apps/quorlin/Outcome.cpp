@@ -14,14 +14,6 @@ namespace Cli {
 
 namespace {
 
-/// Standard output may be a full disk or a closed pipe.
-void Print(const std::string& text) {
-  std::cout << text << std::flush;
-  if (!std::cout) {
-    throw UsageException("cannot write to standard output");
-  }
-}
-
 void ShowOrThrow(const OutputOptions& options, const std::string& heading, const TokenSource& source) {
   std::optional<OutputFile> file;
   if (!options.file.empty()) {
@@ -40,6 +32,13 @@ void ShowOrThrow(const OutputOptions& options, const std::string& heading, const
 
 }  // namespace
 
+void Print(const std::string& text) {
+  std::cout << text << std::flush;
+  if (!std::cout) {
+    throw UsageException("cannot write to standard output");
+  }
+}
+
 void PrintFailure(const Failure& failure) {
   std::cerr << "quorlin: " << MakePrintable(failure.message) << " (" << failure.type << ")\n";
   if (!failure.advice.empty()) {
@@ -53,14 +52,18 @@ int ShowToken(const OutputOptions& options, const std::string& heading, ExitCode
     ShowOrThrow(options, heading, source);
     return EXIT_DONE;
   } catch (...) {
-    const Failure failure = DescribeCurrentException(otherwise);
-    if (options.json) {
-      std::cout << ToText(DescribeFailure(failure)) << std::endl;
-    } else {
-      PrintFailure(failure);
-    }
-    return failure.exitCode;
+    return ShowFailure(options.json, otherwise);
   }
+}
+
+int ShowFailure(bool json, ExitCode otherwise) {
+  const Failure failure = DescribeCurrentException(otherwise);
+  if (json) {
+    std::cout << ToText(DescribeFailure(failure)) << std::endl;
+  } else {
+    PrintFailure(failure);
+  }
+  return failure.exitCode;
 }
 
 int RunReporting(const std::function<void()>& command) {

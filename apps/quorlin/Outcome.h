@@ -27,6 +27,13 @@ using TokenSource = std::function<boost::shared_ptr<const Quorlin::SamlToken>()>
 int ShowToken(const OutputOptions& options, const std::string& heading, ExitCode otherwise,
               const TokenSource& source);
 
+/// Shows a failure: as a JSON object on standard output, or to a person. Returns the program's exit code.
+/// Call it from a catch (...) block.
+int ShowFailure(bool json, ExitCode otherwise);
+
+/// Writes to standard output. Throws UsageException when that is a full disk or a closed pipe.
+void Print(const std::string& text);
+
 /// Tells a person about a failure, on standard error.
 void PrintFailure(const Failure& failure);
 

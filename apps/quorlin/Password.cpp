@@ -200,12 +200,13 @@ Secret ReadPassword(const PasswordOptions& options, const std::string& userName)
   if (options.fromStdin) {
     return ReadToEnd(STDIN_FILENO);
   }
-  if (options.file.empty()) {
-    return AskOnTerminal(userName);
-  }
-  const Descriptor file(open(options.file.c_str(), O_RDONLY | O_CLOEXEC));
+  return options.file.empty() ? AskOnTerminal(userName) : ReadSecretFile(options.file);
+}
+
+Secret ReadSecretFile(const std::string& path) {
+  const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
   if (file.Get() < 0) {
-    throw UsageException("cannot read " + options.file + ": " + std::strerror(errno));
+    throw UsageException("cannot read " + path + ": " + std::strerror(errno));
   }
   return ReadToEnd(file.Get());
 }

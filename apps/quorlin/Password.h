@@ -34,6 +34,9 @@ void AddPasswordOptions(CLI::App& command, PasswordOptions& options);
 /// way to ask for it.
 Secret ReadPassword(const PasswordOptions& options, const std::string& userName);
 
+/// A password or pass phrase from a file, without one line end. Throws UsageException.
+Secret ReadSecretFile(const std::string& path);
+
 }  // namespace Cli
 
 #endif  // QUORLIN_CLI_PASSWORD_H
