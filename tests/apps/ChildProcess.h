@@ -30,6 +30,8 @@ class ChildProcess final {
   ~ChildProcess();
 
   pid_t GetId() const { return _process; }
+  /// Whether nobody has waited for its end yet.
+  bool IsRunning() const { return _process > 0; }
 
   /// All output so far, as soon as `text` is in it. Throws std::runtime_error when the output ends before.
   std::string ReadUntil(const std::string& text);

@@ -29,6 +29,14 @@ struct RunningSts {
       : process(MakeCommand(arguments), ChildProcess::Terminal::NONE),
         ready(Json::parse(process.ReadUntil("\n"))) {}
 
+  /// Killed, it would leave its files behind.
+  ~RunningSts() {
+    if (process.IsRunning()) {
+      process.Signal(SIGTERM);
+      process.Wait();
+    }
+  }
+
   ProcessResult Acquire(const std::string& user, const std::string& password) const {
     std::vector<std::string> arguments = {
         "acquire", "password", "--json",        "--password-stdin", "--user",
