@@ -3,9 +3,8 @@
 
 // Two promises about signatures, for any document:
 // - what verifies under the trusted signer has the content that this signer signed. The seeds are one
-// document, signed by the xmlsec1
-//   program with the key of SignatureFuzzKey.h in the ways of the profile, so there is one content that may
-//   ever come out;
+//   document, signed by the xmlsec1 program with the key of SignatureFuzzKey.h in the ways of the profile, so
+//   there is one content that may ever come out;
 // - what we sign verifies, in the tree and after writing and parsing.
 
 #include "SignatureFuzzKey.h"
