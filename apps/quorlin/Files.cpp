@@ -3,6 +3,7 @@
 
 #include "quorlin/Files.h"
 
+#include "quorlin/Descriptor.h"
 #include "quorlin/Failure.h"
 
 #include <pelmar/crypto/CryptoException.h>
@@ -26,22 +27,6 @@ namespace {
 [[noreturn]] void Refuse(const std::string& what, const std::string& path, int error) {
   throw UsageException("cannot " + what + " " + path + ": " + std::strerror(error));
 }
-
-class Descriptor final {
- public:
-  explicit Descriptor(int number) : _number(number) {}
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-  ~Descriptor() {
-    if (_number > STDERR_FILENO) {
-      close(_number);
-    }
-  }
-  int Get() const { return _number; }
-
- private:
-  int _number;
-};
 
 int OpenForReading(const std::string& path) {
   return path == "-" ? STDIN_FILENO : open(path.c_str(), O_RDONLY | O_CLOEXEC);

@@ -3,6 +3,7 @@
 
 #include "quorlin/Password.h"
 
+#include "quorlin/Descriptor.h"
 #include "quorlin/Failure.h"
 #include "quorlin/Terminal.h"
 
@@ -27,22 +28,6 @@ volatile std::sig_atomic_t endingSignal = 0;
 extern "C" void RememberEndingSignal(int number) {
   endingSignal = number;
 }
-
-class Descriptor final {
- public:
-  explicit Descriptor(int number) : _number(number) {}
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-  ~Descriptor() {
-    if (_number > STDERR_FILENO) {
-      close(_number);
-    }
-  }
-  int Get() const { return _number; }
-
- private:
-  int _number;
-};
 
 /// Bytes that are overwritten when done with.
 class PasswordBuffer final {
