@@ -14,11 +14,14 @@ target_compile_options(quorlin_warnings INTERFACE
 
 add_library(quorlin_hardening INTERFACE)
 # Checked conditions are part of the product: -UNDEBUG stands after whatever the build type or an outer project defines.
-# The macro prefix keeps the builder's paths out of the messages that name a source file.
+# The macro prefixes keep the builder's paths out of the messages that name a source file; a compiler cache may hand the
+# compiler the sources relative to the build tree.
+file(RELATIVE_PATH quorlin_sources_from_build "${PROJECT_BINARY_DIR}" "${PROJECT_SOURCE_DIR}")
 target_compile_options(quorlin_hardening INTERFACE
   -UNDEBUG
   -fstack-protector-strong
-  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
+  "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/="
+  "-fmacro-prefix-map=${quorlin_sources_from_build}=")
 target_compile_definitions(quorlin_hardening INTERFACE _GLIBCXX_ASSERTIONS)
 # _FORTIFY_SOURCE needs an optimised build, and hides accesses from the sanitizers.
 if(NOT QUORLIN_SANITIZE)
