@@ -18,10 +18,10 @@ function(quorlin_install_library target name package)
   set(generated_dir "${PROJECT_BINARY_DIR}/package")
 
   install(TARGETS ${target} EXPORT ${package}Targets
-    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
-    ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}"
-    FILE_SET HEADERS DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}")
-  install(EXPORT ${package}Targets NAMESPACE ${package}:: DESTINATION "${package_dir}")
+    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT runtime NAMELINK_COMPONENT development
+    ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT development
+    FILE_SET HEADERS DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}" COMPONENT development)
+  install(EXPORT ${package}Targets NAMESPACE ${package}:: DESTINATION "${package_dir}" COMPONENT development)
 
   configure_package_config_file("${PROJECT_SOURCE_DIR}/cmake/${package}Config.cmake.in"
     "${generated_dir}/${package}Config.cmake" INSTALL_DESTINATION "${package_dir}")
@@ -31,14 +31,28 @@ function(quorlin_install_library target name package)
   configure_file("${PROJECT_SOURCE_DIR}/cmake/${name}.pc.in" "${generated_dir}/${name}.pc" @ONLY)
 
   install(FILES "${generated_dir}/${package}Config.cmake" "${generated_dir}/${package}ConfigVersion.cmake"
-    DESTINATION "${package_dir}")
-  install(FILES "${generated_dir}/${name}.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+    DESTINATION "${package_dir}" COMPONENT development)
+  install(FILES "${generated_dir}/${name}.pc"
+    DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)
 endfunction()
 
 quorlin_install_library(pelmar_library pelmar Pelmar)
 quorlin_install_library(quorlin_library quorlin Quorlin)
 
 if(TARGET quorlin)
-  install(TARGETS quorlin RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}")
+  install(TARGETS quorlin RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}" COMPONENT tools)
+  set(help_dir "${PROJECT_BINARY_DIR}/help")
+  install(FILES "${help_dir}/quorlin.1" DESTINATION "${CMAKE_INSTALL_MANDIR}/man1" COMPONENT tools)
+  install(FILES "${help_dir}/quorlin.bash" RENAME quorlin
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions" COMPONENT tools)
+  # Where zsh looks depends on whether the system or the administrator installed a program.
+  if(CMAKE_INSTALL_PREFIX STREQUAL "/usr")
+    set(zsh_dir vendor-completions)
+  else()
+    set(zsh_dir site-functions)
+  endif()
+  install(FILES "${help_dir}/_quorlin" DESTINATION "${CMAKE_INSTALL_DATADIR}/zsh/${zsh_dir}" COMPONENT tools)
+  install(FILES "${help_dir}/quorlin.fish"
+    DESTINATION "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d" COMPONENT tools)
 endif()
-install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT development)

@@ -8,6 +8,8 @@ option(QUORLIN_BUILD_TESTS "Build the tests and the checks of the public headers
 option(QUORLIN_BUILD_BENCH "Build the benchmarks" ${PROJECT_IS_TOP_LEVEL})
 option(QUORLIN_BUILD_FUZZ "Build the fuzz targets" ${PROJECT_IS_TOP_LEVEL})
 option(QUORLIN_INSTALL "Generate the install rules" ${PROJECT_IS_TOP_LEVEL})
+option(QUORLIN_PACKAGE "Set cpack up to make Debian packages" OFF)
+option(QUORLIN_RUN_PATH "Let programs and libraries find the libraries they were installed with, wherever that is" ON)
 option(QUORLIN_WERROR "Treat warnings in our own code as errors" OFF)
 option(QUORLIN_LIBFUZZER "Link the fuzz targets with libFuzzer (clang only) instead of the corpus replayer" OFF)
 

@@ -43,7 +43,8 @@ function(quorlin_target_defaults target)
 endfunction()
 
 # quorlin_library_face(<target> <name>): the shared (or, on request, static) library <name> as others see it, with the
-# headers of lib/public/<name> as its interface. Consumers need no more than C++11.
+# headers of lib/public/<name> as its interface. Consumers need no more than C++11. What it exports is bounded by the
+# exports.map beside its CMakeLists.txt.
 function(quorlin_library_face target name)
   file(GLOB_RECURSE headers CONFIGURE_DEPENDS "${PROJECT_SOURCE_DIR}/lib/public/${name}/*.h")
   target_sources(${target} PUBLIC FILE_SET HEADERS BASE_DIRS "${PROJECT_SOURCE_DIR}/lib/public" FILES ${headers})
@@ -59,6 +60,9 @@ function(quorlin_library_face target name)
   # come from the program, so there the check cannot be made.
   if(QUORLIN_LIBRARY_TYPE STREQUAL "SHARED" AND NOT QUORLIN_SANITIZE AND NOT QUORLIN_LIBFUZZER)
     target_link_options(${target} PRIVATE -Wl,--no-undefined)
+    set(exports "${CMAKE_CURRENT_SOURCE_DIR}/exports.map")
+    target_link_options(${target} PRIVATE "-Wl,--version-script=${exports}")
+    set_property(TARGET ${target} APPEND PROPERTY LINK_DEPENDS "${exports}")
   endif()
 endfunction()
 
@@ -66,6 +70,10 @@ endfunction()
 # the path is final from the start: the one CMake would rewrite on installing is padded with empty entries, and to the
 # loader an empty entry is the current folder.
 function(quorlin_run_path target)
+  if(NOT QUORLIN_RUN_PATH)
+    set_target_properties(${target} PROPERTIES INSTALL_RPATH "" BUILD_WITH_INSTALL_RPATH ON)
+    return()
+  endif()
   set(path ${ARGN})
   list(REMOVE_DUPLICATES path)
   set_target_properties(${target} PROPERTIES INSTALL_RPATH "${path}" BUILD_WITH_INSTALL_RPATH ${PROJECT_IS_TOP_LEVEL})

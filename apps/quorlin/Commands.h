@@ -33,6 +33,8 @@ Command AddVerifyCommand(CLI::App& app);
 Command AddStsCommand(CLI::App& app);
 /// demo
 Command AddDemoCommand(CLI::App& app);
+/// generate (hidden)
+Command AddGenerateCommand(CLI::App& app);
 
 }  // namespace Cli
 

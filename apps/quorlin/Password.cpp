@@ -166,8 +166,10 @@ Secret AskOnTerminal(const std::string& userName) {
 }  // namespace
 
 void AddPasswordOptions(CLI::App& command, PasswordOptions& options) {
-  CLI::Option* const file = command.add_option("--password-file", options.file,
-                                               "Read the password from this file (one line end is dropped)");
+  CLI::Option* const file = command
+                                .add_option("--password-file", options.file,
+                                            "Read the password from this file (one line end is dropped)")
+                                ->type_name("FILE");
   command.add_flag("--password-stdin", options.fromStdin, "Read the password from standard input")
       ->excludes(file);
   // Known only to be refused: an unknown option would be repeated in the error message together with the

@@ -53,6 +53,7 @@ std::vector<Cli::Command> AddCommands(CLI::App& app) {
   commands.push_back(Cli::AddVerifyCommand(app));
   commands.push_back(Cli::AddStsCommand(app));
   commands.push_back(Cli::AddDemoCommand(app));
+  commands.push_back(Cli::AddGenerateCommand(app));
   return commands;
 }
 
