@@ -275,6 +275,7 @@ TEST(ElementNode, RefusesBadAttributes) {
       {"xmlns:xml", "urn:x",
        "Invalid argument : the prefix xml and its namespace belong to each other alone"},
       {"xmlns:p", "", "Invalid argument : a prefix is declared without a namespace"},
+      {"xmlns:p", std::string(2049, 'u'), "Invalid argument : more than 2048 bytes in a namespace URI"},
       {"xmlns", "http://www.w3.org/2000/xmlns/",
        "Invalid argument : the namespace of declarations is bound to a prefix"},
       {"present", "secret", "Invalid argument : attribute 'present' is already defined with another value"}};

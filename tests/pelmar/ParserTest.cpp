@@ -382,6 +382,32 @@ TEST(XMLParserLimits, BoundNamespaceDeclarationsInScope) {
             "accepted");
 }
 
+TEST(XMLParserLimits, BoundAttributesInScope) {
+  const auto document = [](std::size_t innermost) {
+    const std::string full = "<a" + Numbered(" a", kMaxAttributesPerElement, "=''");
+    return full + ">\n<b" + Numbered(" a", kMaxAttributesPerElement - 1, "=''") + ">\n<c" +
+           Numbered(" a", innermost, "=''") + "/><c b=''/></b></a>";
+  };
+  EXPECT_EQ(LimitOutcome(document(1)), "accepted");
+  EXPECT_EQ(LimitOutcome(document(2)), "more than 512 attributes in scope at line 3, column 1");
+  // Declarations count too.
+  EXPECT_EQ(LimitOutcome("<a" + Numbered(" a", 256, "=''") + "><b" + Numbered(" a", 255, "=''") +
+                         ">\n<c xmlns='urn:a' xmlns:p='urn:b'/></b></a>"),
+            "more than 512 attributes in scope at line 2, column 1");
+}
+
+TEST(XMLParserLimits, BoundNamespaceUris) {
+  const auto document = [](const std::string& declaration, std::size_t size) {
+    return "<r>\n<a " + declaration + "='" + std::string(size, 'u') + "'/></r>";
+  };
+  for (const char* const declaration : {"xmlns", "xmlns:p"}) {
+    EXPECT_EQ(LimitOutcome(document(declaration, kMaxNamespaceUriBytes)), "accepted");
+    EXPECT_EQ(LimitOutcome(document(declaration, kMaxNamespaceUriBytes + 1)),
+              "more than 2048 bytes in a namespace URI at line 2, column 1");
+  }
+  EXPECT_EQ(LimitOutcome(document("p", kMaxNamespaceUriBytes + 1)), "accepted");
+}
+
 TEST(XMLParserLimits, BoundNodes) {
   EXPECT_EQ(LimitOutcome("<r>" + Repeated("<a/>", kMaxNodes - 1) + "</r>"), "accepted");
   EXPECT_EQ(LimitOutcome("<r>\n" + Repeated("<a/>", kMaxNodes) + "</r>"),

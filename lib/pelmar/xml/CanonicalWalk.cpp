@@ -40,6 +40,11 @@ bool ContainsNode(const Node* container, const Node* node) noexcept {
   return node != nullptr;
 }
 
+// Mostly both stand for the same declaration; the text is then not looked at.
+int CompareUris(const std::string* a, const std::string* b) noexcept {
+  return a == b ? 0 : a->compare(*b);
+}
+
 }  // namespace
 
 CanonicalWalk::CanonicalWalk(const CanonicalForm& form, Writer* writer, const Node* omitted)
@@ -259,7 +264,7 @@ void CanonicalWalk::ResolveAttributes(const ElementNode* element) {
 // The order of UTF-8 bytes is the order of code points.
 void CanonicalWalk::SortAttributes() {
   std::sort(_attributes.begin(), _attributes.end(), [](const PlainAttribute& a, const PlainAttribute& b) {
-    const int order = a.uri->compare(*b.uri);
+    const int order = CompareUris(a.uri, b.uri);
     return order != 0 ? order < 0 : a.localName < b.localName;
   });
 }
@@ -308,7 +313,7 @@ void CanonicalWalk::Render(std::string_view prefix, const std::string* uri) {
     return;
   }
   const std::string* const outer = Find(_rendered, prefix);
-  if (outer != nullptr ? *outer != *uri : !uri->empty()) {
+  if (outer != nullptr ? CompareUris(outer, uri) != 0 : !uri->empty()) {
     _rendered.push_back({prefix, uri});
   }
 }

@@ -92,7 +92,8 @@ void ExpatSession::CountNodes(std::size_t count) {
 }
 
 void ExpatSession::StartElement(const char* name, const char* const* attributes) {
-  if (++_depth > kMaxElementDepth) {
+  _outerAttributes.push_back(_attributesInScope);
+  if (_outerAttributes.size() > kMaxElementDepth) {
     Refuse(MoreThan(kMaxElementDepth, "elements inside each other"));
   }
   const std::size_t count = CountAttributes(attributes);
@@ -100,6 +101,10 @@ void ExpatSession::StartElement(const char* name, const char* const* attributes)
     Refuse(MoreThan(kMaxAttributesPerElement, "attributes on one element"));
   }
   CountNodes(1 + count);
+  _attributesInScope += count;
+  if (_attributesInScope > kMaxAttributesInScope) {
+    Refuse(MoreThan(kMaxAttributesInScope, "attributes in scope"));
+  }
   const char* const fault = _namespaces.EnterElement(name, attributes);
   if (fault != nullptr) {
     Refuse(fault);
@@ -112,7 +117,8 @@ void ExpatSession::StartElement(const char* name, const char* const* attributes)
 }
 
 void ExpatSession::EndElement() {
-  --_depth;
+  _attributesInScope = _outerAttributes.back();
+  _outerAttributes.pop_back();
   _namespaces.LeaveElement();
   // The end event of an empty tag has no bytes of its own.
   _handler->EndElement(XML_GetCurrentByteCount(_parser.get()) == 0);

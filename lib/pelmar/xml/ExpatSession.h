@@ -16,6 +16,7 @@
 #include <exception>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace Pelmar {
 namespace Xml {
@@ -66,7 +67,9 @@ class ExpatSession final {
   std::string_view _text;
   TextPlace _place;
   NamespaceChecker _namespaces;
-  std::size_t _depth = 0;
+  // For each open element, how many attributes were in scope outside it.
+  std::vector<std::size_t> _outerAttributes;
+  std::size_t _attributesInScope = 0;
   std::size_t _nodes = 0;
   std::exception_ptr _failure;
 };

@@ -5,6 +5,8 @@
 
 #include "pelmar/xml/ExpatHandle.h"
 
+#include <pelmar/xml/Parser.h>
+
 #include <algorithm>
 #include <array>
 #include <cstddef>
@@ -100,6 +102,10 @@ bool IsQualifiedName(std::string_view name) noexcept {
 }
 
 const char* FindDeclarationFault(std::string_view prefix, std::string_view uri) noexcept {
+  static_assert(kMaxNamespaceUriBytes == 2048, "the text below names the limit");
+  if (uri.size() > kMaxNamespaceUriBytes) {
+    return "more than 2048 bytes in a namespace URI";
+  }
   if (prefix == "xmlns") {
     return "the prefix xmlns is declared";
   }

@@ -45,7 +45,13 @@ enum ParserLimit : std::size_t {
   kMaxNodes = 256 * 1024,
   kMaxElementDepth = 256,
   kMaxAttributesPerElement = 256,
-  kMaxNamespaceDeclarationsInScope = 256
+  kMaxNamespaceDeclarationsInScope = 256,
+  /// On an element and all around it. Looking a prefix up passes over all of them, and an element with
+  /// thousands around it may have a hundred thousand others beside it.
+  kMaxAttributesInScope = 512,
+  /// Canonical XML sorts attributes by the URIs of their namespaces: with long ones, each of them used by
+  /// many attributes, that would take minutes.
+  kMaxNamespaceUriBytes = 2048
 };
 
 /// Takes the parser's events in document order. Names and values are UTF-8, normalised as XML 1.0 demands,
