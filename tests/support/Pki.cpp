@@ -139,9 +139,14 @@ std::string GetKeyUsage(const CertificateSpec& spec) {
   return spec.ca ? "keyCertSign,cRLSign" : "digitalSignature,nonRepudiation,keyEncipherment";
 }
 
+std::string GetBasicConstraints(const CertificateSpec& spec) {
+  const std::string kind = spec.ca ? "critical,CA:TRUE" : "critical,CA:FALSE";
+  return spec.pathLength < 0 ? kind : kind + ",pathlen:" + std::to_string(spec.pathLength);
+}
+
 void AddExtensions(X509* x509, X509* issuer, const CertificateSpec& spec) {
   if (!spec.withoutBasicConstraints) {
-    AddExtension(x509, issuer, NID_basic_constraints, spec.ca ? "critical,CA:TRUE" : "critical,CA:FALSE");
+    AddExtension(x509, issuer, NID_basic_constraints, GetBasicConstraints(spec));
   }
   if (!GetKeyUsage(spec).empty()) {
     AddExtension(x509, issuer, NID_key_usage, "critical," + GetKeyUsage(spec));
@@ -151,6 +156,9 @@ void AddExtensions(X509* x509, X509* issuer, const CertificateSpec& spec) {
   }
   if (!spec.subjectAlternativeName.empty()) {
     AddExtension(x509, issuer, NID_subject_alt_name, spec.subjectAlternativeName);
+  }
+  if (!spec.nameConstraints.empty()) {
+    AddExtension(x509, issuer, NID_name_constraints, "critical," + spec.nameConstraints);
   }
   if (spec.keyIdentifiers) {
     AddExtension(x509, issuer, NID_subject_key_identifier, "hash");
@@ -182,7 +190,7 @@ Handle<X509> ToX509(const Crypto::Certificate& certificate) {
 /// A null `issuer` makes a self-signed certificate.
 Identity Make(X509* issuer, EVP_PKEY* issuerKey, const CertificateSpec& spec) {
   constexpr long kVersion3 = 2;
-  const KeyPair key = KeyPair::Get(spec.keyKind, spec.keyNumber);
+  const KeyPair key = spec.key ? KeyPair(spec.key) : KeyPair::Get(spec.keyKind, spec.keyNumber);
   const Handle<X509> x509(X509_new());
   X509* const signer = issuer == nullptr ? x509.get() : issuer;
   EVP_PKEY* const signingKey = issuerKey == nullptr ? key.GetHandle() : issuerKey;

@@ -88,6 +88,12 @@ struct CertificateSpec {
   bool keyIdentifiers = false;
   /// Adds a critical extension that nobody knows.
   bool unknownCriticalExtension = false;
+  /// Of basicConstraints: how many other CAs may stand below this one; negative: any number.
+  int pathLength = -1;
+  /// In OpenSSL's configuration syntax, for example "permitted;DNS:example.com"; empty: left out.
+  std::string nameConstraints;
+  /// Used instead of the key that `keyKind` and `keyNumber` name.
+  std::shared_ptr<evp_pkey_st> key;
 };
 
 /// A certificate with its private key.

@@ -102,6 +102,8 @@ struct ReferencePlan {
   std::vector<std::string> inclusivePrefixes = {};
   /// Also the outdated sha1 and md5.
   std::string digestMethod = Pelmar::Xml::Security::kSha256;
+  /// How many of the digest's bytes are written into DigestValue; those beyond its end are zeros.
+  std::optional<std::size_t> digestBytes = {};
   /// Stands in place of the Transforms element that follows from the above.
   std::optional<std::string> transforms = {};
 };

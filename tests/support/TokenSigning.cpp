@@ -2,7 +2,7 @@
 // Copyright the Quorlin authors
 
 // Signs a text where its marker stands. Unlike the platform's own signer it can do what a forger would try,
-// too.
+// too, and with any key.
 
 #include "support/TokenFactory.h"
 
@@ -10,6 +10,7 @@
 
 #include <pelmar/StringUtil.h>
 
+#include <openssl/ec.h>
 #include <openssl/evp.h>
 #include <openssl/hmac.h>
 
@@ -37,27 +38,24 @@ constexpr DigestRow kDigests[] = {{kSha256, "SHA256"},
                                   {"http://www.w3.org/2000/09/xmldsig#sha1", "SHA1"},
                                   {"http://www.w3.org/2001/04/xmldsig-more#md5", "MD5"}};
 
-enum class Scheme { PLATFORM, RSA, HMAC };
+enum class Scheme { RSA, EC, HMAC };
 
 struct MethodRow {
   const char* uri;
   Scheme scheme;
   const char* digest;
-  Pelmar::Crypto::DigestAlgorithm platformDigest;
 };
 
-using namespace Pelmar::Crypto;
-
 constexpr MethodRow kMethods[] = {
-    {kRsaSha256, Scheme::PLATFORM, "", DIGEST_SHA256},
-    {kRsaSha384, Scheme::PLATFORM, "", DIGEST_SHA384},
-    {kRsaSha512, Scheme::PLATFORM, "", DIGEST_SHA512},
-    {kEcdsaSha256, Scheme::PLATFORM, "", DIGEST_SHA256},
-    {kEcdsaSha384, Scheme::PLATFORM, "", DIGEST_SHA384},
-    {kEcdsaSha512, Scheme::PLATFORM, "", DIGEST_SHA512},
-    {"http://www.w3.org/2000/09/xmldsig#rsa-sha1", Scheme::RSA, "SHA1", DIGEST_SHA256},
-    {"http://www.w3.org/2001/04/xmldsig-more#rsa-md5", Scheme::RSA, "MD5", DIGEST_SHA256},
-    {"http://www.w3.org/2001/04/xmldsig-more#hmac-sha256", Scheme::HMAC, "SHA256", DIGEST_SHA256}};
+    {kRsaSha256, Scheme::RSA, "SHA256"},
+    {kRsaSha384, Scheme::RSA, "SHA384"},
+    {kRsaSha512, Scheme::RSA, "SHA512"},
+    {kEcdsaSha256, Scheme::EC, "SHA256"},
+    {kEcdsaSha384, Scheme::EC, "SHA384"},
+    {kEcdsaSha512, Scheme::EC, "SHA512"},
+    {"http://www.w3.org/2000/09/xmldsig#rsa-sha1", Scheme::RSA, "SHA1"},
+    {"http://www.w3.org/2001/04/xmldsig-more#rsa-md5", Scheme::RSA, "MD5"},
+    {"http://www.w3.org/2001/04/xmldsig-more#hmac-sha256", Scheme::HMAC, "SHA256"}};
 
 template <typename Row, std::size_t size>
 const Row& RequireRow(const Row (&table)[size], const std::string& uri) {
@@ -108,17 +106,26 @@ Bytes AuthenticateWithPublicKey(const KeyPair& key, const char* digest, const st
   return value;
 }
 
+// The two numbers side by side, each as long as the order of the curve (RFC 4050, section 3.3).
+Bytes ToRawEcdsaValue(const Bytes& der, const EVP_PKEY* key) {
+  const auto* position = der.data();
+  const std::unique_ptr<ECDSA_SIG, void (*)(ECDSA_SIG*)> numbers(
+      d2i_ECDSA_SIG(nullptr, &position, static_cast<long>(der.size())), ECDSA_SIG_free);
+  Check(numbers != nullptr);
+  const int size = (EVP_PKEY_get_bits(key) + 7) / 8;
+  Bytes raw(static_cast<std::size_t>(size) * 2);
+  Check(BN_bn2binpad(ECDSA_SIG_get0_r(numbers.get()), raw.data(), size) == size &&
+        BN_bn2binpad(ECDSA_SIG_get0_s(numbers.get()), raw.data() + size, size) == size);
+  return raw;
+}
+
 Bytes MakeValue(const Identity& signer, const std::string& method, const std::string& octets) {
   const MethodRow& row = RequireRow(kMethods, method);
-  switch (row.scheme) {
-    case Scheme::RSA:
-      return SignWithOpenSsl(signer.keyPair, row.digest, octets);
-    case Scheme::HMAC:
-      return AuthenticateWithPublicKey(signer.keyPair, row.digest, octets);
-    case Scheme::PLATFORM:
-      break;
+  if (row.scheme == Scheme::HMAC) {
+    return AuthenticateWithPublicKey(signer.keyPair, row.digest, octets);
   }
-  return signer.GetKey()->Sign(row.platformDigest, octets.data(), octets.size());
+  const Bytes value = SignWithOpenSsl(signer.keyPair, row.digest, octets);
+  return row.scheme == Scheme::EC ? ToRawEcdsaValue(value, signer.keyPair.GetHandle()) : value;
 }
 
 // --- The signature's text, with the values still to come ---
@@ -254,7 +261,8 @@ std::string FillDigests(const std::string& text, const TokenSigning& signing) {
     const std::string octets = CanonicalText(FindTarget(document, signature, plan),
                                              plan.canonicalization.empty() ? kC14n : plan.canonicalization,
                                              plan.inclusivePrefixes, plan.enveloped ? signature : nullptr);
-    const Bytes digest = DigestWith(RequireRow(kDigests, plan.digestMethod).name, octets);
+    Bytes digest = DigestWith(RequireRow(kDigests, plan.digestMethod).name, octets);
+    digest.resize(plan.digestBytes.value_or(digest.size()));
     filled = ReplaceOnce(filled, DigestPlace(i), Pelmar::StringUtil::Base64Encode(digest));
   }
   return filled;
