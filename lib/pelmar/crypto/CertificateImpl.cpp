@@ -3,6 +3,7 @@
 
 #include "pelmar/crypto/CertificateImpl.h"
 
+#include "pelmar/crypto/CertificateCache.h"
 #include "pelmar/crypto/OpenSslError.h"
 #include "pelmar/crypto/OpenSslHandles.h"
 #include "pelmar/crypto/X509Fields.h"
@@ -110,7 +111,7 @@ bool LooksLikeIssuer(const CertificateImpl& issuer, const CertificateImpl& subje
 }
 
 Ref<const Certificate> CreateCertificateFromDer(const std::vector<unsigned char>& der) {
-  return MakeRef<CertificateImpl>(der);
+  return GetCertificateCache().Read(der);
 }
 
 }  // namespace Crypto
