@@ -4,16 +4,22 @@
 // Tokens that the xmlsec1 program signed, and the tests' own signer judged by it.
 
 #include "quorlin/Namespaces.h"
+#include "support/GoldenText.h"
 #include "support/Process.h"
 #include "support/TemporaryDirectory.h"
 #include "support/TokenFactory.h"
 #include "support/Verdict.h"
 
+#include <pelmar/StringUtil.h>
+
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <filesystem>
 #include <stdexcept>
 #include <string>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 namespace {
@@ -180,9 +186,12 @@ class TokenInteropTrust : public testing::Test {
   const std::string token = SignWithXmlsec(TokenText(), Template(), {leaf, intermediate});
 };
 
+std::string Error(const std::string& reason) {
+  return "Quorlin::InvalidSignatureException: Signature verification error. " + reason;
+}
+
 std::string Untrusted(const std::string& reason) {
-  return "Quorlin::InvalidSignatureException: Signature verification error. Certificate chain is not trusted: " +
-         reason;
+  return Error("Certificate chain is not trusted: " + reason);
 }
 
 TEST_F(TokenInteropTrust, ComesFromLeafIntermediateOrRoot) {
@@ -246,16 +255,180 @@ TEST(TokenInterop, AgreesOnWhatTheTestsSign) {
   }
 }
 
+// --- What is refused ---
+
+const char* const kTampered =
+    "Quorlin::InvalidSignatureException: Failed to verify signature: token might have been tampered with.";
+
+struct Alteration {
+  const char* from;
+  std::string to;
+};
+
 TEST(TokenInterop, AgreesOnAlteredTokens) {
   const Identity root = MakeCa("Interop root", 1);
   const Identity signer = MakeIssued(root, CertificateSpec());
-  const std::string token = SignToken(TokenText().Compose(), signer);
+  TokenText text;
+  text.attributes = AttributeElement(Quorlin::kAttrGroupIdentity, {"D\\users"});
+  text.restrictions = ProxyRestriction("Count=\"1\"");
+  const std::string token = SignToken(text.Compose(), signer);
   ASSERT_TRUE(XmlsecVerifies(token, root));
-  const std::string altered = ReplaceOnce(token, kTokenSubject, "mallory@example.com");
-  EXPECT_FALSE(XmlsecVerifies(altered, root));
-  EXPECT_EQ(
-      VerdictOnToken(altered, Trust({root})),
-      "Quorlin::InvalidSignatureException: Failed to verify signature: token might have been tampered with.");
+  const Alteration alterations[] = {
+      {kTokenSubject, "mallory@example.com"},
+      {kTokenSubject, std::string(kTokenSubject) + " "},
+      {"D\\users", "D\\others"},
+      {"Count=\"1\"", "Count=\"2\""},
+      {"<saml:ProxyRestriction Count=\"1\"/>", ""},
+      {"</saml:Subject>", "</saml:Subject>\n"},
+      {"<ds:SignedInfo>", "<ds:SignedInfo Id=\"i\">"},
+      {"<ds:SignedInfo>", "<ds:SignedInfo> "},
+      {"<ds:DigestValue>", "<ds:DigestValue>AAAA"},
+      {"<ds:SignatureValue>", "<ds:SignatureValue>AAAA"},
+      {"#rsa-sha256", "#rsa-sha512"},
+      {"URI=\"#_4f0a9c1e\"", "URI=\"\""},
+  };
+  for (const Alteration& alteration : alterations) {
+    const std::string altered = ReplaceOnce(token, alteration.from, alteration.to);
+    EXPECT_FALSE(XmlsecVerifies(altered, root)) << alteration.to;
+    EXPECT_EQ(VerdictOnToken(altered, Trust({root})), kTampered) << alteration.to;
+  }
+}
+
+using Bytes = std::vector<unsigned char>;
+
+Bytes Part(const Bytes& bytes, std::size_t begin, std::size_t end) {
+  return Bytes(bytes.begin() + static_cast<std::ptrdiff_t>(begin),
+               bytes.begin() + static_cast<std::ptrdiff_t>(end));
+}
+
+Bytes Join(const Bytes& a, const Bytes& b) {
+  Bytes all = a;
+  all.insert(all.end(), b.begin(), b.end());
+  return all;
+}
+
+/// Values of another size, without their beginning or end, and of nothing but zeros.
+std::vector<Bytes> MisshapenValues(const Bytes& value) {
+  const std::size_t size = value.size();
+  return {Join(Bytes(1), value),
+          Join(value, Bytes(1)),
+          Part(value, 1, size),
+          Part(value, 0, size - 1),
+          Join(Part(value, size / 2, size), Part(value, 0, size / 2)),
+          Bytes(size),
+          Bytes(size, 0xFF)};
+}
+
+TEST(TokenInterop, AgreesOnMisshapenSignatureValues) {
+  const Identity root = MakeCa("Interop root", 1);
+  for (const auto& [kind, method] :
+       {std::make_pair(KeyKind::RSA_2048, kRsaSha256), std::make_pair(KeyKind::EC_P256, kEcdsaSha256)}) {
+    CertificateSpec spec;
+    spec.keyKind = kind;
+    TokenSigning signing;
+    signing.signatureMethod = method;
+    const std::string token = SignToken(TokenText().Compose(), MakeIssued(root, spec), signing);
+    ASSERT_TRUE(XmlsecVerifies(token, root)) << method;
+    const std::string base64 = CutBetween(token, "<ds:SignatureValue>", "</ds:SignatureValue>");
+    for (const Bytes& value : MisshapenValues(Pelmar::StringUtil::Base64Decode(base64))) {
+      const std::string altered = ReplaceOnce(token, base64, Pelmar::StringUtil::Base64Encode(value));
+      EXPECT_FALSE(XmlsecVerifies(altered, root)) << method << value.size();
+      EXPECT_EQ(VerdictOnToken(altered, Trust({root})), kTampered) << method << value.size();
+    }
+  }
+}
+
+/// A certificate that the root issued, and that must not be believed.
+struct BadSigner {
+  Identity signer;
+  std::vector<Identity> shown;
+  const char* reason;
+};
+
+std::vector<BadSigner> MakeBadSigners(const Identity& root) {
+  CertificateSpec expired;
+  expired.notBefore = -2 * kYear;
+  expired.notAfter = -kDay;
+  CertificateSpec early;
+  early.notBefore = kDay;
+  CertificateSpec noCa;
+  noCa.commonName = "No CA";
+  noCa.keyNumber = 2;
+  const Identity leaf = MakeIssued(root, noCa);
+  CertificateSpec foreign;
+  foreign.keyNumber = 5;
+  const Identity pretender = MakeCa("Interop root", 6);
+  return {{MakeIssued(root, expired), {}, "certificate has expired (CN=Test signer)"},
+          {MakeIssued(root, early), {}, "certificate is not yet valid (CN=Test signer)"},
+          {MakeIssued(leaf, CertificateSpec()), {leaf}, "invalid CA certificate (CN=No CA)"},
+          {MakeSelfSigned(foreign), {}, "self-signed certificate (CN=Test signer)"},
+          {MakeIssued(pretender, CertificateSpec()), {}, "certificate signature failure (CN=Test signer)"}};
+}
+
+TEST(TokenInterop, AgreesOnCertificatesThatProveNothing) {
+  const Identity root = MakeCa("Interop root", 1);
+  for (const BadSigner& bad : MakeBadSigners(root)) {
+    TokenSigning signing;
+    signing.alsoShown = bad.shown;
+    const std::string token = SignToken(TokenText().Compose(), bad.signer, signing);
+    EXPECT_FALSE(XmlsecVerifies(token, root)) << bad.reason;
+    EXPECT_EQ(VerdictOnToken(token, Trust({root})), Untrusted(bad.reason));
+  }
+}
+
+TEST(TokenInterop, AgreesOnTokensWithoutACertificate) {
+  const Identity root = MakeCa("Interop root", 1);
+  const Identity signer = MakeIssued(root, CertificateSpec());
+  const std::string none = Error("The signature's KeyInfo holds no certificate");
+  const std::pair<const char*, std::string> keyInfos[] = {
+      {"", Error("The signature has no KeyInfo")},
+      {"<ds:KeyInfo/>", none},
+      {"<ds:KeyInfo><ds:KeyName>k</ds:KeyName></ds:KeyInfo>", none}};
+  for (const auto& [keyInfo, verdict] : keyInfos) {
+    TokenSigning signing;
+    signing.keyInfo = keyInfo;
+    const std::string token = SignToken(TokenText().Compose(), signer, signing);
+    EXPECT_FALSE(XmlsecVerifies(token, root)) << keyInfo;
+    EXPECT_EQ(VerdictOnToken(token, Trust({root})), verdict) << keyInfo;
+  }
+}
+
+// --- The token vectors ---
+
+/// The names of the vectors of a folder that begin like this.
+std::vector<std::string> ListVectors(const std::string& folder, const std::string& start) {
+  std::vector<std::string> names;
+  for (const auto& entry :
+       std::filesystem::directory_iterator(QUORLIN_TEST_VECTORS_DIR "/tokens/" + folder)) {
+    const std::string name = entry.path().filename().string();
+    if (entry.path().extension() == ".xml" && name.compare(0, start.size(), start) == 0) {
+      names.push_back(name);
+    }
+  }
+  std::sort(names.begin(), names.end());
+  return names;
+}
+
+bool XmlsecVerifiesVector(const std::string& path) {
+  const std::string folder = QUORLIN_TEST_VECTORS_DIR "/tokens/";
+  return RunXmlsec({"--verify", kIdOption, kIdElement, "--trusted-pem", folder + "signer.pem", folder + path})
+             .exitCode == 0;
+}
+
+TEST(TokenInterop, AgreesOnTheAcceptedVectors) {
+  const std::vector<std::string> names = ListVectors("accept", "");
+  EXPECT_GT(names.size(), 20U);
+  for (const std::string& name : names) {
+    EXPECT_TRUE(XmlsecVerifiesVector("accept/" + name)) << name;
+  }
+}
+
+TEST(TokenInterop, AgreesOnTheAlteredVectors) {
+  const std::vector<std::string> names = ListVectors("reject", "altered-");
+  EXPECT_GE(names.size(), 5U);
+  for (const std::string& name : names) {
+    EXPECT_FALSE(XmlsecVerifiesVector("reject/" + name)) << name;
+  }
 }
 
 }  // namespace
