@@ -17,6 +17,8 @@ namespace Cli {
 
 namespace {
 
+constexpr const char* kNoAssertion = "Expected element 'Assertion' not found.";
+
 std::string GetUnqualifiedName(const std::type_info& type) {
   int status = 0;
   const std::unique_ptr<char, void (*)(void*)> name(
@@ -59,8 +61,15 @@ std::string GetAdvice(const std::exception& e) {
     return "Check the user name and the password.";
   }
   if (Is<Quorlin::InvalidSignatureException>(e)) {
-    return "The token must be signed with a trusted certificate: check the file given with --sts-cert or --trust, and "
-           "that the token was not changed on its way.";
+    return "The token must be signed with a certificate that --sts-cert or --trust names, or that chains to one of them, "
+           "and must not have been changed on its way.";
+  }
+  if (Is<Pelmar::Xml::XMLParseException>(e)) {
+    return "That is not the XML of a token, which is one document in UTF-8.";
+  }
+  if (Is<Quorlin::ParseException>(e) && e.what() == std::string(kNoAssertion)) {
+    return "The document is no SAML 2.0 assertion. If it holds one, as a SOAP answer does, quorlin verify --embedded finds "
+           "it.";
   }
   return "";
 }

@@ -52,6 +52,28 @@ void WriteAll(int descriptor, const std::string& content, const std::string& pat
   }
 }
 
+/// What the file seems to be instead of certificates; empty when that cannot be told.
+std::string GuessWhatElse(const std::string& content) {
+  constexpr char kDerSequence = 0x30;
+  if (content.empty()) {
+    return "the file is empty";
+  }
+  if (content.front() == kDerSequence && content.find('\0') != std::string::npos) {
+    return "that looks like DER; PEM is what \"openssl x509 -inform der\" makes of it";
+  }
+  if (content.find("PRIVATE KEY-----") != std::string::npos) {
+    return "there is a private key in it, which is not needed here";
+  }
+  return "";
+}
+
+[[noreturn]] void RefuseCertificates(const std::string& path, const std::string& content,
+                                     const char* reason) {
+  const std::string guess = GuessWhatElse(content);
+  throw UsageException("cannot use the certificates in " + path + ": " + reason +
+                       (guess.empty() ? "" : " (" + guess + ")"));
+}
+
 }  // namespace
 
 std::string ReadFileUpTo(const std::string& path, std::size_t maxBytes) {
@@ -86,10 +108,11 @@ std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> ReadCertificates(
     const std::vector<std::string>& paths) {
   std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> certificates;
   for (const std::string& path : paths) {
+    const std::string content = ReadFile(path);
     try {
-      certificates.splice(certificates.end(), Pelmar::Crypto::CreateCertificatesFromPem(ReadFile(path)));
+      certificates.splice(certificates.end(), Pelmar::Crypto::CreateCertificatesFromPem(content));
     } catch (const Pelmar::Crypto::CryptoException& e) {
-      throw UsageException("cannot use the certificates in " + path + ": " + e.what());
+      RefuseCertificates(path, content, e.what());
     }
   }
   return certificates;
