@@ -60,7 +60,11 @@ void AddServiceOptions(CLI::App& command, ServiceOptions& options) {
       command, "--ca", options.caFiles,
       "Trust the TLS servers of these authorities; without it, those the system trusts. May be repeated")
       ->type_name("PEM");
-  AddRepeatable(command, "--sts-cert", options.stsCertificateFiles,
+  AddStsCertificateOption(command, options.stsCertificateFiles);
+}
+
+void AddStsCertificateOption(CLI::App& command, std::vector<std::string>& files) {
+  AddRepeatable(command, "--sts-cert", files,
                 "Accept tokens signed with these certificates or by their authorities. May be repeated")
       ->required()
       ->type_name("PEM");
@@ -87,13 +91,18 @@ Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& opti
   if (!IsPlainHttp(options)) {
     config.sslContext = MakeSslContext(options);
   }
-  if (!holderOfKey.keyFile.empty()) {
-    Quorlin::HolderOfKeyConfig identity;
-    identity.privateKey = ReadKey(holderOfKey);
-    identity.certificate = ReadCertificates({holderOfKey.certificateFile}).front();
-    config.holderOfKeyConfig = identity;
-  }
+  config.holderOfKeyConfig = MakeHolderOfKeyConfig(holderOfKey);
   return config;
+}
+
+boost::optional<Quorlin::HolderOfKeyConfig> MakeHolderOfKeyConfig(const HolderOfKeyOptions& options) {
+  if (options.keyFile.empty()) {
+    return boost::none;
+  }
+  Quorlin::HolderOfKeyConfig identity;
+  identity.privateKey = ReadKey(options);
+  identity.certificate = ReadCertificates({options.certificateFile}).front();
+  return identity;
 }
 
 bool IsPlainHttp(const ServiceOptions& options) {

@@ -11,6 +11,8 @@
 
 #include <CLI/CLI.hpp>
 
+#include <boost/optional.hpp>
+
 #include <string>
 #include <vector>
 
@@ -34,6 +36,12 @@ struct HolderOfKeyOptions {
 
 /// Adds --cert, --key and --key-password-file. The first two are wanted together, or always when `required`.
 void AddHolderOfKeyOptions(CLI::App& command, HolderOfKeyOptions& options, bool required);
+
+/// Adds --sts-cert.
+void AddStsCertificateOption(CLI::App& command, std::vector<std::string>& files);
+
+/// Reads the files; nothing when none are named. Throws UsageException.
+boost::optional<Quorlin::HolderOfKeyConfig> MakeHolderOfKeyConfig(const HolderOfKeyOptions& options);
 
 /// Reads the files. An https: URL without --ca trusts what the operating system trusts. Throws
 /// UsageException.

@@ -17,8 +17,12 @@ void AddTokenFileOption(CLI::App& command, std::string& file) {
 
 boost::shared_ptr<const Quorlin::SamlToken> ReadToken(const std::string& file,
                                                       const Quorlin::SecurityTokenServiceConfig& config) {
-  const std::string xml = ReadFileUpTo(file, Pelmar::Xml::kMaxDocumentBytes + 1);
-  return Quorlin::CreateSamlToken(xml, config.trustedStsCertificates);
+  return ReadToken(file, config.trustedStsCertificates);
+}
+
+boost::shared_ptr<const Quorlin::SamlToken> ReadToken(
+    const std::string& file, const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>& trusted) {
+  return Quorlin::CreateSamlToken(ReadFileUpTo(file, Pelmar::Xml::kMaxDocumentBytes + 1), trusted);
 }
 
 }  // namespace Cli

@@ -13,6 +13,7 @@
 
 #include <boost/shared_ptr.hpp>
 
+#include <list>
 #include <string>
 
 namespace Cli {
@@ -24,6 +25,9 @@ void AddTokenFileOption(CLI::App& command, std::string& file);
 /// throws, and UsageException for a file that cannot be read.
 boost::shared_ptr<const Quorlin::SamlToken> ReadToken(const std::string& file,
                                                       const Quorlin::SecurityTokenServiceConfig& config);
+/// The same with the certificates `trusted`.
+boost::shared_ptr<const Quorlin::SamlToken> ReadToken(
+    const std::string& file, const std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>& trusted);
 
 }  // namespace Cli
 

@@ -51,6 +51,9 @@ std::vector<Cli::Command> AddCommands(CLI::App& app) {
   commands.push_back(Cli::AddRenewCommand(app));
   commands.push_back(Cli::AddValidateCommand(app));
   commands.push_back(Cli::AddVerifyCommand(app));
+  for (const Cli::Command& command : Cli::AddRequestCommands(app)) {
+    commands.push_back(command);
+  }
   commands.push_back(Cli::AddStsCommand(app));
   commands.push_back(Cli::AddDemoCommand(app));
   commands.push_back(Cli::AddGenerateCommand(app));
