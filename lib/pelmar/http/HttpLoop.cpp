@@ -10,6 +10,7 @@
 #include <pthread.h>
 
 #include <csignal>
+#include <ctime>
 #include <exception>
 #include <system_error>
 #include <utility>
@@ -61,7 +62,11 @@ HttpLoop& HttpLoop::Get() {
   return *loop;
 }
 
-HttpLoop::HttpLoop(QueueFunction queue) : _queue(std::move(queue)) {}
+HttpLoop::HttpLoop(QueueFunction queue)
+    : HttpLoop(std::move(queue), [] { return static_cast<Seconds>(std::time(nullptr)); }) {}
+
+HttpLoop::HttpLoop(QueueFunction queue, LaneSet::GetTimeFunction getTime)
+    : _queue(std::move(queue)), _getTime(std::move(getTime)) {}
 
 HttpLoop::~HttpLoop() {
   Shutdown();
@@ -164,7 +169,7 @@ void HttpLoop::StartThread() {
 
 void HttpLoop::Run() {
   {
-    LaneSet lanes(*_poller);
+    LaneSet lanes(*_poller, _getTime);
     std::vector<Command> commands;
     while (TakeCommands(commands)) {
       for (const Command& command : commands) {

@@ -31,6 +31,8 @@ class HttpLoop final {
   using QueueFunction = std::function<void(const boost::function<void()>&)>;
 
   explicit HttpLoop(QueueFunction queue);
+  /// With a clock of its own for the age of TLS sessions.
+  HttpLoop(QueueFunction queue, LaneSet::GetTimeFunction getTime);
   HttpLoop(const HttpLoop&) = delete;
   HttpLoop& operator=(const HttpLoop&) = delete;
   /// Shuts down.
@@ -72,6 +74,7 @@ class HttpLoop final {
   bool Redeliver();
 
   const QueueFunction _queue;
+  const LaneSet::GetTimeFunction _getTime;
   std::mutex _mutex;
   // All below are guarded by the mutex.
   std::vector<Command> _commands;

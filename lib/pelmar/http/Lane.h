@@ -39,7 +39,7 @@ class Lane final {
   ~Lane();
 
   /// Throws HttpException when the exchange cannot be started.
-  void Start(const Ref<Exchange>& exchange, CURLSH* share);
+  void Start(const Ref<Exchange>& exchange, const SharedState& shared);
   /// Ends the exchange and closes its connection. Unknown ones are ignored.
   void Abandon(const Exchange* exchange);
 

@@ -14,16 +14,6 @@ namespace Http {
 
 namespace {
 
-ShareHandle CreateShare() {
-  ShareHandle share(curl_share_init());
-  // One thread uses it, so it needs no lock functions.
-  if (!share || curl_share_setopt(share.get(), CURLSHOPT_SHARE, CURL_LOCK_DATA_SSL_SESSION) != CURLSHE_OK ||
-      curl_share_setopt(share.get(), CURLSHOPT_SHARE, CURL_LOCK_DATA_DNS) != CURLSHE_OK) {
-    throw HttpException("The HTTP engine cannot be set up");
-  }
-  return share;
-}
-
 /// Rounded up: to wake early is to wake twice.
 int CountMilliseconds(Lane::Clock::duration duration) {
   const auto count = std::chrono::ceil<std::chrono::milliseconds>(duration).count();
@@ -32,7 +22,7 @@ int CountMilliseconds(Lane::Clock::duration duration) {
 
 }  // namespace
 
-LaneSet::LaneSet(Poller& poller) : _poller(poller) {}
+LaneSet::LaneSet(Poller& poller, GetTimeFunction getTime) : _poller(poller), _getTime(std::move(getTime)) {}
 
 LaneSet::~LaneSet() = default;
 
@@ -42,7 +32,7 @@ void LaneSet::Submit(const Ref<Exchange>& exchange) {
   }
   try {
     const AgentParts& agent = exchange->GetAgent();
-    GetLane(agent.id).Start(exchange, GetShare(agent.spec->GetId()));
+    GetLane(agent.id).Start(exchange, _shares[agent.spec->GetId()].Get(_getTime()));
   } catch (const HttpException& e) {
     exchange->Settle(std::make_shared<const HttpException>(e), nullptr);
   } catch (const std::exception&) {
@@ -76,14 +66,6 @@ Lane& LaneSet::GetLane(std::uint64_t agent) {
   }
   auto lane = std::make_unique<Lane>(_poller, _owners);
   return *_lanes.emplace(agent, LaneEntry{std::move(lane), false}).first->second.lane;
-}
-
-CURLSH* LaneSet::GetShare(std::uint64_t spec) {
-  ShareHandle& share = _shares[spec];
-  if (!share) {
-    share = CreateShare();
-  }
-  return share.get();
 }
 
 void LaneSet::Turn(int maxMilliseconds) {

@@ -10,8 +10,10 @@
 #include "pelmar/http/Exchange.h"
 #include "pelmar/http/Lane.h"
 #include "pelmar/http/Poller.h"
+#include "pelmar/http/SpecShare.h"
 
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 
@@ -21,7 +23,10 @@ namespace Http {
 /// Lives on the HTTP loop's thread.
 class LaneSet final {
  public:
-  explicit LaneSet(Poller& poller);
+  /// Tells the time that certificates are judged by.
+  using GetTimeFunction = std::function<Seconds()>;
+
+  LaneSet(Poller& poller, GetTimeFunction getTime);
   LaneSet(const LaneSet&) = delete;
   LaneSet& operator=(const LaneSet&) = delete;
   ~LaneSet();
@@ -44,15 +49,15 @@ class LaneSet final {
   };
 
   Lane& GetLane(std::uint64_t agent);
-  CURLSH* GetShare(std::uint64_t spec);
   int GetTimeout(int maxMilliseconds) const;
   void RunDeadlines();
   void RemoveOrphans();
 
   Poller& _poller;
+  const GetTimeFunction _getTime;
   SocketOwners _owners;
   // Before the lanes, so that it goes after them: their connections use it.
-  std::map<std::uint64_t, ShareHandle> _shares;
+  std::map<std::uint64_t, SpecShare> _shares;
   std::map<std::uint64_t, LaneEntry> _lanes;
   bool _mayHaveOrphans = false;
 };

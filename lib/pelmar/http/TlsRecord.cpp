@@ -14,14 +14,24 @@
 #include <openssl/ssl.h>
 #include <openssl/x509v3.h>
 
+#include <algorithm>
 #include <cstdlib>
+#include <limits>
 
 namespace Pelmar {
 namespace Http {
 
 namespace {
 
-using RecordHolder = std::shared_ptr<TlsRecord>;
+/// What a connection carries along. It outlives the exchange that opened it.
+struct Companion {
+  std::shared_ptr<TlsRecord> record;
+  std::shared_ptr<SessionExpiry> expiry;
+  /// When the first certificate of the verified chain expires. Of a resumed session only the earliest that it
+  /// may be is known.
+  Seconds chainEnd;
+  int (*keepSession)(SSL*, SSL_SESSION*);
+};
 
 struct NamesDeleter {
   void operator()(GENERAL_NAMES* names) const noexcept { GENERAL_NAMES_free(names); }
@@ -100,34 +110,53 @@ void RecordProblem(X509_STORE_CTX* verification, TlsRecord& record) {
   }
 }
 
-int VerifyAndRecord(X509_STORE_CTX* verification, void* record) {
+Seconds FindEnd(const X509* certificate) {
+  constexpr long long kMicrosecondsPerSecond = 1000000;
+  return Crypto::ReadX509Time(X509_get0_notAfter(certificate)).GetUtcTime() / kMicrosecondsPerSecond;
+}
+
+/// The anchor counts too: its dates are checked like the others'.
+Seconds FindChainEnd(X509_STORE_CTX* verification) {
+  const STACK_OF(X509)* const chain = X509_STORE_CTX_get0_chain(verification);
+  Seconds end = std::numeric_limits<Seconds>::max();
+  for (int i = 0; i < sk_X509_num(chain); ++i) {
+    end = std::min(end, FindEnd(sk_X509_value(chain, i)));
+  }
+  return end;
+}
+
+int VerifyAndRecord(X509_STORE_CTX* verification, void* data) {
+  Companion& companion = *static_cast<Companion*>(data);
+  companion.chainEnd = 0;
   const int verdict = X509_verify_cert(verification);
-  if (verdict <= 0) {
-    try {
-      RecordProblem(verification, *static_cast<TlsRecord*>(record));
-    } catch (const std::exception&) {
-      // A certificate too odd to describe; the verdict stands and the message says less.
-      Crypto::ClearOpenSslErrors();
+  try {
+    if (verdict > 0) {
+      companion.chainEnd = FindChainEnd(verification);
+    } else {
+      RecordProblem(verification, *companion.record);
     }
+  } catch (const std::exception&) {
+    // A certificate too odd to describe; the verdict stands, the message says less, and no session is
+    // resumed.
+    Crypto::ClearOpenSslErrors();
   }
   return verdict;
 }
 
 // --- The course of the handshake ---
 
-void FreeHolder(void*, void* holder, CRYPTO_EX_DATA*, int, long, void*) {
-  delete static_cast<RecordHolder*>(holder);
+void FreeCompanion(void*, void* companion, CRYPTO_EX_DATA*, int, long, void*) {
+  delete static_cast<Companion*>(companion);
 }
 
-// The context of a connection outlives the exchange that opened it, so it owns its record.
-int GetHolderIndex() {
-  static const int index = SSL_CTX_get_ex_new_index(0, nullptr, nullptr, nullptr, FreeHolder);
+int GetCompanionIndex() {
+  static const int index = SSL_CTX_get_ex_new_index(0, nullptr, nullptr, nullptr, FreeCompanion);
   return index;
 }
 
-const RecordHolder& GetHolder(const SSL* connection) {
-  return *static_cast<const RecordHolder*>(
-      SSL_CTX_get_ex_data(SSL_get_SSL_CTX(connection), GetHolderIndex()));
+const Companion& GetCompanion(const SSL* connection) {
+  return *static_cast<const Companion*>(
+      SSL_CTX_get_ex_data(SSL_get_SSL_CTX(connection), GetCompanionIndex()));
 }
 
 TlsAlert ClassifyAlert(int code) {
@@ -146,7 +175,7 @@ void RecordAlert(const SSL* connection, int where, int value) {
   if ((where & SSL_CB_ALERT) == 0) {
     return;
   }
-  TlsRecord& record = *GetHolder(connection);
+  TlsRecord& record = *GetCompanion(connection).record;
   const bool isFromServer = (where & SSL_CB_READ) != 0;
   const int code = value & 0xff;
   if (code == SSL_AD_CLOSE_NOTIFY) {
@@ -165,16 +194,29 @@ int RecordCertificateRequest(SSL*, void* record) {
   return kGoOn;
 }
 
-void AttachRecord(SSL_CTX* tls, const RecordHolder& record) {
-  auto holder = std::make_unique<RecordHolder>(record);
-  if (SSL_CTX_set_ex_data(tls, GetHolderIndex(), holder.get()) != 1) {
+// Called when the server has given a session to resume, perhaps long after the handshake.
+int LimitAndKeepSession(SSL* connection, SSL_SESSION* session) {
+  const Companion& companion = GetCompanion(connection);
+  companion.expiry->Limit(companion.chainEnd);
+  return companion.keepSession(connection, session);
+}
+
+void AttachCompanion(SSL_CTX* tls, const std::shared_ptr<TlsRecord>& record,
+                     const std::shared_ptr<SessionExpiry>& expiry) {
+  auto owner =
+      std::make_unique<Companion>(Companion{record, expiry, expiry->Get(), SSL_CTX_sess_get_new_cb(tls)});
+  Companion* const companion = owner.get();
+  if (SSL_CTX_set_ex_data(tls, GetCompanionIndex(), companion) != 1) {
     Crypto::ThrowOpenSslError("TLS cannot be set up");
   }
-  static_cast<void>(holder.release());  // The context's now.
+  static_cast<void>(owner.release());  // The context's now.
   record->hasClientCertificate = SSL_CTX_get0_certificate(tls) != nullptr;
-  SSL_CTX_set_cert_verify_callback(tls, VerifyAndRecord, record.get());
+  SSL_CTX_set_cert_verify_callback(tls, VerifyAndRecord, companion);
   SSL_CTX_set_cert_cb(tls, RecordCertificateRequest, record.get());
   SSL_CTX_set_info_callback(tls, RecordAlert);
+  if (companion->keepSession != nullptr) {
+    SSL_CTX_sess_set_new_cb(tls, LimitAndKeepSession);
+  }
 }
 
 // --- Trust ---
@@ -225,18 +267,18 @@ TlsFailureKind ClassifyReason(int reason) {
 }  // namespace
 
 void ConfigureTls(SSL_CTX* tls, const Ssl::SSLContextImpl& context, const std::string& serverName,
-                  const std::shared_ptr<TlsRecord>& record) {
+                  const std::shared_ptr<TlsRecord>& record, const std::shared_ptr<SessionExpiry>& expiry) {
   context.ConfigureSslCtx(tls);
   SetAnchorsApart(tls);
   SSL_CTX_set_verify(tls, SSL_VERIFY_PEER, nullptr);
   RequireServerName(tls, serverName);
   // The HTTP engine would write the session keys to the file that an environment variable names.
   SSL_CTX_set_keylog_callback(tls, nullptr);
-  AttachRecord(tls, record);
+  AttachCompanion(tls, record, expiry);
 }
 
 std::shared_ptr<const TlsRecord> GetTlsRecord(const SSL* connection) {
-  return GetHolder(connection);
+  return GetCompanion(connection).record;
 }
 
 TlsFailureReason FindTlsFailureReason(const std::string& engineText) {

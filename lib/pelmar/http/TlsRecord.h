@@ -6,6 +6,8 @@
 #ifndef PELMAR_HTTP_TLSRECORD_H
 #define PELMAR_HTTP_TLSRECORD_H
 
+#include "pelmar/http/SpecShare.h"
+
 #include <cstddef>
 #include <memory>
 #include <string>
@@ -70,9 +72,10 @@ struct TlsFailureReason {
 /// Readies `tls` for one connection to `serverName` with the anchors and identity of `context`, and has the
 /// handshake tell `record` about itself. The record changes no verdict. On top of what the HTTP engine
 /// checks, the server's certificate must be for `serverName` by its subject alternative names; the common
-/// name does not count (RFC 9525, section 6.3). Throws CryptoException.
+/// name does not count (RFC 9525, section 6.3). `expiry` is told how long the sessions may live that the HTTP
+/// engine keeps. Throws CryptoException.
 void ConfigureTls(ssl_ctx_st* tls, const Ssl::SSLContextImpl& context, const std::string& serverName,
-                  const std::shared_ptr<TlsRecord>& record);
+                  const std::shared_ptr<TlsRecord>& record, const std::shared_ptr<SessionExpiry>& expiry);
 
 /// The record of a connection that was set up by `ConfigureTls`, perhaps for an earlier exchange.
 std::shared_ptr<const TlsRecord> GetTlsRecord(const ssl_st* connection);

@@ -41,14 +41,14 @@ bool HasHeader(const RequestParts& request, const std::string& lowerName) {
 
 }  // namespace
 
-Transfer::Transfer(const Ref<Exchange>& exchange, CURLSH* share)
-    : _exchange(exchange), _easy(curl_easy_init()) {
+Transfer::Transfer(const Ref<Exchange>& exchange, const SharedState& shared)
+    : _exchange(exchange), _shared(shared), _easy(curl_easy_init()) {
   if (!_easy) {
     throw HttpException("The HTTP engine cannot be set up");
   }
   Set(CURLOPT_ERRORBUFFER, _engineText);
   Set(CURLOPT_PRIVATE, this);
-  Set(CURLOPT_SHARE, share);
+  Set(CURLOPT_SHARE, _shared.handle.get());
   SetIsolation();
   SetAddress();
   SetRequest();
@@ -194,7 +194,8 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
   auto* const self = static_cast<Transfer*>(transfer);
   try {
     const ConnectionSpecImpl& spec = *self->_exchange->GetAgent().spec;
-    ConfigureTls(static_cast<ssl_ctx_st*>(tls), *spec.GetContext(), spec.GetServerName(), self->_tls);
+    ConfigureTls(static_cast<ssl_ctx_st*>(tls), *spec.GetContext(), spec.GetServerName(), self->_tls,
+                 self->_shared.expiry);
     return CURLE_OK;
   } catch (const Exception& e) {
     self->_tlsSetupFault = e.what();

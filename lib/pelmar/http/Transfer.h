@@ -9,6 +9,7 @@
 #include "pelmar/http/CurlHandles.h"
 #include "pelmar/http/Exchange.h"
 #include "pelmar/http/ResponseHead.h"
+#include "pelmar/http/SpecShare.h"
 #include "pelmar/http/TlsRecord.h"
 
 #include <cstddef>
@@ -22,9 +23,9 @@ namespace Http {
 /// Lives on the HTTP loop's thread.
 class Transfer final {
  public:
-  /// `share` keeps the TLS sessions and addresses of the spec. Throws HttpException when the engine refuses a
+  /// `shared` has the TLS sessions and addresses of the spec. Throws HttpException when the engine refuses a
   /// setting.
-  Transfer(const Ref<Exchange>& exchange, CURLSH* share);
+  Transfer(const Ref<Exchange>& exchange, const SharedState& shared);
   Transfer(const Transfer&) = delete;
   Transfer& operator=(const Transfer&) = delete;
   ~Transfer() = default;
@@ -56,6 +57,7 @@ class Transfer final {
   std::shared_ptr<const HttpException> DescribeFailure(CURLcode code) const;
 
   const Ref<Exchange> _exchange;
+  const SharedState _shared;
   char _engineText[CURL_ERROR_SIZE] = "";
   TextList _headers;
   TextList _route;
