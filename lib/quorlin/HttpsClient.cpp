@@ -86,6 +86,10 @@ HttpsClient::HttpsClient(const std::string& url, Pelmar::Ssl::SSLContext* sslCon
   if (parts.isHttps && !_sslContext) {
     throw Pelmar::InvalidArgumentException("HTTPS connection requested but no SSLContext provided.");
   }
+  if (!parts.isHttps && !sslConnectionParam.empty()) {
+    // Whoever pins a key wants to talk to nobody else.
+    throw Pelmar::InvalidArgumentException("Public-key pins given, but the URL is not https.");
+  }
   _connectionSpec = Http::CreateTCPConnectionSpec(parts.host, parts.port);
   if (parts.isHttps) {
     _connectionSpec =

@@ -49,7 +49,8 @@ class HttpsSession final : public TransportSession {
 class HttpsClient final : public Transport {
  public:
   /// `sslContext` may be null for an http: URL; for https: that is an InvalidArgumentException.
-  /// `sslConnectionParam` is handed to the TLS layer as it is. Throws also what the platform's URL parser and
+  /// `sslConnectionParam` is handed to the TLS layer as it is; not empty for an http: URL, where nothing could
+  /// keep to it, is an InvalidArgumentException. Throws also what the platform's URL parser and
   /// connection specs throw.
   HttpsClient(const std::string& url, Pelmar::Ssl::SSLContext* sslContext, std::string sslConnectionParam,
               long long timeoutMicroseconds);

@@ -209,6 +209,18 @@ TEST(HttpsClient, HandsTheConnectionParameterToTheTlsLayer) {
                Pelmar::InvalidArgumentException);
 }
 
+TEST(HttpsClient, RefusesPinsThatPlainHttpCouldNotKeepTo) {
+  const Pelmar::Ref<Pelmar::Ssl::SSLContext> context = ContextTrusting(TestSupport::MakeCa());
+  for (const char* pins : {"sha256//AAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAA=", "no pin"}) {
+    try {
+      const HttpsClient client("http://localhost/", context.Get(), pins, kPatience);
+      FAIL() << pins;
+    } catch (const Pelmar::InvalidArgumentException& error) {
+      EXPECT_STREQ("Invalid argument : Public-key pins given, but the URL is not https.", error.what());
+    }
+  }
+}
+
 TEST(HttpsClient, TakesAnSslContextForPlainHttpToo) {
   const LoopbackServer server({AnswerEach({HttpAnswer("200 OK", "answer")})});
   const Pelmar::Ref<Pelmar::Ssl::SSLContext> context = ContextTrusting(TestSupport::MakeCa());
