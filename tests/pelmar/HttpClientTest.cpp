@@ -278,7 +278,9 @@ TEST(HttpClient, TakesStatusReasonAndBody) {
       {"HTTP/1.1 599 Strange\r\nContent-Length: 0\r\n\r\n", "599 Strange|"},
       {"HTTP/1.1 200 A\x1b[31mB\x7f\r\nContent-Length: 0\r\n\r\n", "200 A?[31mB?|"},
       {"HTTP/1.1 200 OK\r\nContent-Encoding: identity\r\nContent-Length: 2\r\n\r\nhi", "200 OK|hi"},
+      // RFC 9112, section 2.2: a line feed alone may be taken for a line's end.
       {"HTTP/1.1 200 OK\nContent-Length: 2\n\nhi", "200 OK|hi"},
+      {"HTTP/1.1 200 OK\r\nContent-Length: 2\n\r\nhi", "200 OK|hi"},
       {"HTTP/1.0 200 OK\r\n\r\nuntil the end", "200 OK|until the end"},
       {"HTTP/1.1 200 OK\r\n\r\nuntil the end", "200 OK|until the end"},
       {"HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n3\r\none\r\n4;x=y\r\n two\r\n0\r\n\r\n",
@@ -316,6 +318,14 @@ TEST(HttpClient, TakesAnswerGivenBeforeTheRequestIsRead) {
   EXPECT_EQ("413 Too Large|", CallOnce([](ServerConnection& connection) {
               connection.ReadSome();
               connection.Send("HTTP/1.1 413 Too Large\r\nContent-Length: 0\r\nConnection: close\r\n\r\n");
+              connection.Close();
+            }));
+}
+
+TEST(HttpClient, TakesAnswerSentBeforeAnythingIsRead) {
+  EXPECT_EQ("200 OK|hello", CallOnce([](ServerConnection& connection) {
+              connection.Send("HTTP/1.1 200 OK\r\nContent-Length: 5\r\nConnection: close\r\n\r\nhello");
+              connection.ReadRequest();
               connection.Close();
             }));
 }

@@ -176,6 +176,48 @@ TEST(HttpFaults, RefusesCodingsThatWereNotAskedFor) {
             CallOnce(SendAndClose("HTTP/1.1 200 OK\r\nTransfer-Encoding: gzip, chunked\r\n\r\n0\r\n\r\n")));
 }
 
+// What different readers on the way could take for different messages.
+TEST(HttpFaults, RefusesAnswersWithTwoReadings) {
+  const std::string malformed = "HttpException: PEER answered 200 OK with a malformed header line";
+  const std::string unclear = "HttpException: PEER answered 200 OK without a clear length of its body";
+  const std::string coding = "HttpException: PEER answered 200 OK with a transfer coding other than chunked";
+  const std::string chunks = "5\r\nhello\r\n0\r\n\r\n";
+  const struct {
+    std::string headers;
+    std::string body;
+    std::string outcome;
+  } cases[] = {
+      {"Content-Length: 5\r\nContent-Length: 3\r\n", "hello", unclear},
+      {"Content-Length: 3\r\nContent-Length: 5\r\n", "hello", unclear},
+      {"Content-Length: 5\r\nContent-Length: 5\r\n", "hello", unclear},
+      {"Content-Length: 5, 3\r\n", "hello", unclear},
+      {"Content-Length: +5\r\n", "hello", unclear},
+      {"Content-Length: 5\r\nTransfer-Encoding: chunked\r\n", chunks, unclear},
+      {"Transfer-Encoding: chunked\r\nContent-Length: 5\r\n", chunks, unclear},
+      {"Transfer-Encoding: chunked\r\nTransfer-Encoding: chunked\r\n", chunks, coding},
+      {"Transfer-Encoding: chunked, identity\r\n", chunks, coding},
+      {"Transfer-Encoding : chunked\r\n", chunks, malformed},
+      {"Content-Length : 5\r\n", "hello", malformed},
+      {"X-Folded: a\r\n Content-Length: 5\r\n", "hello", malformed},
+      {"X-Folded: a\r\n\tb\r\nContent-Length: 5\r\n", "hello", malformed},
+      {"Content-Length: 5\r\n(no name): a\r\n", "hello", malformed},
+      {"Content-Length: 5\r\nX: a\rb\r\n", "hello", malformed},
+  };
+  for (const auto& c : cases) {
+    EXPECT_EQ(c.outcome, CallOnce(SendAndClose("HTTP/1.1 200 OK\r\n" + c.headers + "\r\n" + c.body)))
+        << c.headers;
+  }
+  EXPECT_EQ(coding, CallOnce(SendAndClose("HTTP/1.0 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n" + chunks)));
+}
+
+TEST(HttpFaults, RefusesHeaderLinesThatTheEngineCannotRead) {
+  EXPECT_EQ("HttpException: PEER did not answer in HTTP/1",
+            CallOnce(SendAndClose("HTTP/1.1 200 OK\r\nContent-Length: 5\r\nno colon\r\n\r\nhello")));
+  EXPECT_EQ(
+      "HttpException: PEER did not answer in HTTP/1",
+      CallOnce(SendAndClose(std::string("HTTP/1.1 200 OK\r\nX: a\0b\r\nContent-Length: 0\r\n\r\n", 46))));
+}
+
 // --- Answers without measure ---
 
 TEST(HttpFaults, BoundsTheBody) {

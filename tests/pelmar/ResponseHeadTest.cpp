@@ -52,8 +52,8 @@ TEST(ResponseHead, IsCompleteAfterTheEmptyLineOfTheFinalResponse) {
 
 TEST(ResponseHead, TakesNoStatusFromHeadersAndTrailers) {
   ResponseHead head;
-  EXPECT_EQ(HeadFault::NONE, TakeAll(head, {"HTTP/1.1 200 OK\r\n", "HTTP/1.1 500 No\r\n", "\r\n",
-                                            "HTTP/1.1 404 No\r\n", "\r\n", "Content-Encoding: gzip\r\n"}));
+  EXPECT_EQ(HeadFault::NONE, TakeAll(head, {"HTTP/1.1 200 OK\r\n", "\r\n", "HTTP/1.1 404 No\r\n", "\r\n",
+                                            "Content-Encoding: gzip\r\n"}));
   EXPECT_EQ(200, head.GetStatusCode());
   EXPECT_EQ("OK", head.GetReason());
 }
@@ -61,14 +61,21 @@ TEST(ResponseHead, TakesNoStatusFromHeadersAndTrailers) {
 TEST(ResponseHead, RefusesOtherVersionsAndBadCodes) {
   for (const char* const line :
        {"HTTP/2 200 OK\r\n", "HTTP/2.0 200 OK\r\n", "HTTP/0.9 200 OK\r\n", "HTTP/1.1\r\n", "HTTP/1.1 20\r\n",
-        "HTTP/1.1 2x0 OK\r\n", "HTTP/1.1  200 OK\r\n", "HTTP/\r\n"}) {
+        "HTTP/1.1 2x0 OK\r\n", "HTTP/1.1  200 OK\r\n", "HTTP/\r\n", "HTTP/1.x 200 OK\r\n",
+        "HTTP/1.1x200 OK\r\n", "HTTP/1.1 2000 OK\r\n", "HTTP/1.1 200OK\r\n", "HTTP/1.1 099 OK\r\n",
+        "http/1.1 200 OK\r\n", "X: a\r\n", "\r\n"}) {
     EXPECT_EQ(HeadFault::NOT_HTTP_1, Judge({line})) << line;
   }
 }
 
+TEST(ResponseHead, RefusesAnythingButAStatusLineAfterAnInterimResponse) {
+  EXPECT_EQ(HeadFault::NOT_HTTP_1, Judge({"HTTP/1.1 100 C\r\n", "\r\n", "X: a\r\n"}));
+  EXPECT_EQ(HeadFault::NOT_HTTP_1, Judge({"HTTP/1.1 100 C\r\n", "\r\n", "\r\n"}));
+}
+
 TEST(ResponseHead, RefusesCodingsOfTheFinalResponseOnly) {
   EXPECT_EQ(HeadFault::NONE, Judge({"HTTP/1.1 100 C\r\n", "Content-Encoding: gzip\r\n"}));
-  EXPECT_EQ(HeadFault::CONTENT_CODING, Judge({"HTTP/1.1 200 OK\r\n", "CONTENT-ENCODING :\t gzip \r\n"}));
+  EXPECT_EQ(HeadFault::CONTENT_CODING, Judge({"HTTP/1.1 200 OK\r\n", "CONTENT-ENCODING:\t gzip \r\n"}));
   EXPECT_EQ(HeadFault::CONTENT_CODING,
             Judge({"HTTP/1.1 200 OK\r\n", "Content-Encoding: identity, gzip\r\n"}));
   EXPECT_EQ(HeadFault::NONE,
@@ -78,6 +85,53 @@ TEST(ResponseHead, RefusesCodingsOfTheFinalResponseOnly) {
             Judge({"HTTP/1.1 200 OK\r\n", "Transfer-Encoding: gzip, chunked\r\n"}));
   EXPECT_EQ(HeadFault::TRANSFER_CODING,
             Judge({"HTTP/1.1 200 OK\r\n", "Transfer-Encoding:\r\n", " gzip\r\n"}));
+}
+
+TEST(ResponseHead, RefusesLinesThatAreNoFields) {
+  for (const std::string& line : {
+           std::string("HTTP/1.1 500 No\r\n"),
+           std::string("no colon\r\n"),
+           std::string(": no name\r\n"),
+           std::string("Content-Length : 5\r\n"),
+           std::string("Content-Length\t: 5\r\n"),
+           std::string(" folded: yes\r\n"),
+           std::string("\tfolded\r\n"),
+           std::string("X: a\0b\r\n", 8),
+           std::string("X: a\rb\r\n"),
+           std::string("X: a\x1b[31m\r\n"),
+           std::string("N\xC3\xA9: a\r\n"),
+           std::string("(X): a\r\n"),
+       }) {
+    EXPECT_EQ(HeadFault::BAD_FIELD, Judge({"HTTP/1.1 200 OK\r\n", line})) << line;
+    EXPECT_EQ(HeadFault::BAD_FIELD, Judge({"HTTP/1.1 103 Early Hints\r\n", line})) << line;
+  }
+  for (const char* const line :
+       {"X:\r\n", "X: \t a\tb \r\n", "!#$%&'*+-.^_`|~09azAZ:a\n", "X: \xC3\xA9 \xFF\r\n"}) {
+    EXPECT_EQ(HeadFault::NONE, Judge({"HTTP/1.1 200 OK\r\n", line})) << line;
+  }
+}
+
+TEST(ResponseHead, TakesOneClearOpinionAboutTheBodysLength) {
+  const std::string kOk = "HTTP/1.1 200 OK\r\n";
+  const std::string kFive = "Content-Length: 5\r\n";
+  const std::string kChunked = "Transfer-Encoding: chunked\r\n";
+  EXPECT_EQ(HeadFault::NONE, Judge({kOk, kFive, "\r\n"}));
+  EXPECT_EQ(HeadFault::NONE, Judge({kOk, kChunked, "\r\n"}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kOk, kFive, "content-length: 6\r\n"}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kOk, kFive, kFive}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kOk, kFive, kChunked}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kOk, kChunked, kFive}));
+  for (const char* const value : {"", "+5", "-5", "5, 5", "5,6", "0x5", "5 6", "5;", "five"}) {
+    EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kOk, std::string("Content-Length: ") + value + "\r\n"}))
+        << value;
+  }
+  EXPECT_EQ(HeadFault::TRANSFER_CODING, Judge({kOk, kChunked, kChunked}));
+  for (const char* const value :
+       {"", "identity", "chunked, chunked", "chunked, identity", "xchunked", "\"chunked\""}) {
+    EXPECT_EQ(HeadFault::TRANSFER_CODING, Judge({kOk, std::string("Transfer-Encoding: ") + value + "\r\n"}))
+        << value;
+  }
+  EXPECT_EQ(HeadFault::TRANSFER_CODING, Judge({"HTTP/1.0 200 OK\r\n", kChunked}));
 }
 
 TEST(ResponseHead, KeepsItsFirstFault) {
@@ -109,7 +163,7 @@ TEST(ResponseHead, KnowsWhatEndsTheBody) {
 TEST(ResponseHead, BoundsAllLinesTogether) {
   ResponseHead head;
   TakeAll(head, {"HTTP/1.1 100 C\r\n"});
-  const std::string filler(kMaxResponseHeaderBytes - 16, 'x');
+  const std::string filler = "X:" + std::string(kMaxResponseHeaderBytes - 18, 'x');
   EXPECT_EQ(HeadFault::NONE, head.TakeLine(filler.data(), filler.size()));
   EXPECT_EQ(HeadFault::TOO_LARGE, head.TakeLine("\n", 1));
 }

@@ -7,12 +7,14 @@
 #include <pelmar/http/Client.h>
 
 #include <algorithm>
+#include <cstring>
 
 namespace Pelmar {
 namespace Http {
 
 namespace {
 
+constexpr std::size_t kMinorVersionOffset = 7;
 constexpr std::size_t kStatusCodeOffset = 9;  // After "HTTP/1.x ".
 constexpr std::size_t kStatusCodeDigits = 3;
 
@@ -34,6 +36,36 @@ std::string RemoveLineEnd(std::string line) {
   return line;
 }
 
+// RFC 9110, section 5.6.2.
+bool IsTokenCharacter(char c) {
+  return IsDigit(c) || (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') ||
+         (c != '\0' && std::strchr("!#$%&'*+-.^_`|~", c) != nullptr);
+}
+
+bool IsControl(char c) {
+  return (c >= '\0' && c < ' ') || c == '\x7f';
+}
+
+/// RFC 9112, section 5: a name, at once a colon, and a value without control characters (RFC 9110, section
+/// 5.5). A line that starts with white space continues the one before (section 5.2), which is deprecated, and
+/// which the HTTP engine does not join; it has no name.
+bool IsField(const std::string& line, std::size_t colon) {
+  return colon != std::string::npos && colon > 0 &&
+         std::all_of(line.begin(), line.begin() + static_cast<std::ptrdiff_t>(colon), IsTokenCharacter) &&
+         std::none_of(line.begin(), line.end(), [](char c) { return IsControl(c) && c != '\t'; });
+}
+
+/// "HTTP/1.x" and a code of three digits from 100 on, with a blank before it and after it, if anything
+/// follows.
+bool IsStatusLine(const std::string& line) {
+  constexpr std::size_t kEnd = kStatusCodeOffset + kStatusCodeDigits;
+  return line.compare(0, kMinorVersionOffset, "HTTP/1.") == 0 && line.size() >= kEnd &&
+         IsDigit(line[kMinorVersionOffset]) && line[kStatusCodeOffset - 1] == ' ' &&
+         line[kStatusCodeOffset] != '0' &&
+         std::all_of(line.begin() + kStatusCodeOffset, line.begin() + kEnd, IsDigit) &&
+         (line.size() == kEnd || line[kEnd] == ' ');
+}
+
 bool IsInterim(int statusCode) {
   return statusCode < 200;
 }
@@ -41,8 +73,7 @@ bool IsInterim(int statusCode) {
 }  // namespace
 
 std::string MaskControlCharacters(std::string text) {
-  std::replace_if(
-      text.begin(), text.end(), [](char c) { return (c >= '\0' && c < ' ') || c == '\x7f'; }, '?');
+  std::replace_if(text.begin(), text.end(), IsControl, '?');
   return text;
 }
 
@@ -59,50 +90,69 @@ HeadFault ResponseHead::TakeLine(const char* line, std::size_t size) {
 bool ResponseHead::IsEndedByConnection() const {
   constexpr int kNoContent = 204;
   constexpr int kNotModified = 304;
-  return _isComplete && !_hasLength && _statusCode != kNoContent && _statusCode != kNotModified;
+  return _isComplete && !_hasContentLength && !_hasTransferCoding && _statusCode != kNoContent &&
+         _statusCode != kNotModified;
 }
 
 HeadFault ResponseHead::Judge(const std::string& line) {
   if (_isComplete) {
     return HeadFault::NONE;  // A trailer.
   }
-  if (IsInterim(_statusCode) && line.compare(0, 5, "HTTP/") == 0) {
+  if (_awaitsStatusLine) {
     return TakeStatusLine(line);
   }
   if (line.empty()) {
-    _isComplete = !IsInterim(_statusCode);
+    _awaitsStatusLine = IsInterim(_statusCode);
+    _isComplete = !_awaitsStatusLine;
     return HeadFault::NONE;
   }
-  return IsInterim(_statusCode) ? HeadFault::NONE : TakeField(line);
+  return TakeField(line);
 }
 
 HeadFault ResponseHead::TakeStatusLine(const std::string& line) {
-  const std::string code = line.substr(0, 7) == "HTTP/1." && line.size() >= kStatusCodeOffset
-                               ? line.substr(kStatusCodeOffset, kStatusCodeDigits)
-                               : std::string();
-  if (code.size() != kStatusCodeDigits || !std::all_of(code.begin(), code.end(), IsDigit)) {
+  if (!IsStatusLine(line)) {
     return HeadFault::NOT_HTTP_1;
   }
-  _statusCode = std::stoi(code);
+  _awaitsStatusLine = false;
+  _isHttp10 = line[kMinorVersionOffset] == '0';
+  _statusCode = std::stoi(line.substr(kStatusCodeOffset, kStatusCodeDigits));
   _reason = MaskControlCharacters(TrimBlanks(line.substr(kStatusCodeOffset + kStatusCodeDigits)));
   return HeadFault::NONE;
 }
 
 HeadFault ResponseHead::TakeField(const std::string& line) {
   const std::size_t colon = line.find(':');
-  if (colon == std::string::npos) {
+  if (!IsField(line, colon)) {
+    return HeadFault::BAD_FIELD;
+  }
+  if (IsInterim(_statusCode)) {
     return HeadFault::NONE;
   }
-  const std::string name = StringUtil::ToLower(TrimBlanks(line.substr(0, colon)));
+  const std::string name = StringUtil::ToLower(line.substr(0, colon));
   const std::string value = StringUtil::ToLower(TrimBlanks(line.substr(colon + 1)));
-  _hasLength = _hasLength || name == "content-length" || name == "transfer-encoding";
-  if (name == "content-encoding" && !value.empty() && value != "identity") {
-    return HeadFault::CONTENT_CODING;
+  if (name == "content-length") {
+    return TakeContentLength(value);
   }
-  if (name == "transfer-encoding" && value != "chunked") {
+  if (name == "transfer-encoding") {
+    return TakeTransferCoding(value);
+  }
+  const bool isCoded = name == "content-encoding" && !value.empty() && value != "identity";
+  return isCoded ? HeadFault::CONTENT_CODING : HeadFault::NONE;
+}
+
+HeadFault ResponseHead::TakeContentLength(const std::string& value) {
+  const bool isClear = !_hasContentLength && !_hasTransferCoding && !value.empty() &&
+                       std::all_of(value.begin(), value.end(), IsDigit);
+  _hasContentLength = true;
+  return isClear ? HeadFault::NONE : HeadFault::BODY_LENGTH;
+}
+
+HeadFault ResponseHead::TakeTransferCoding(const std::string& value) {
+  if (value != "chunked" || _hasTransferCoding || _isHttp10) {
     return HeadFault::TRANSFER_CODING;
   }
-  return HeadFault::NONE;
+  _hasTransferCoding = true;
+  return _hasContentLength ? HeadFault::BODY_LENGTH : HeadFault::NONE;
 }
 
 }  // namespace Http

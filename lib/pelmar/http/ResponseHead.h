@@ -17,11 +17,15 @@ enum class HeadFault {
   TOO_LARGE,        ///< More than kMaxResponseHeaderBytes, interim responses and trailers included.
   NOT_HTTP_1,       ///< A status line of another protocol or version.
   CONTENT_CODING,   ///< A Content-Encoding, though the request asked for none.
-  TRANSFER_CODING,  ///< A Transfer-Encoding other than chunked.
+  TRANSFER_CODING,  ///< A Transfer-Encoding other than chunked, once, in HTTP/1.1.
+  BAD_FIELD,        ///< A header line that is no name, colon and value, or that continues the one before.
+  BODY_LENGTH,  ///< More than one opinion about where the body ends, or a Content-Length that is no number.
 };
 
 /// Follows the lines of interim responses, the final one and trailers. Splitting the stream into lines, body
-/// lengths and the connection's fate are the HTTP engine's; this decides what we do not want to see at all.
+/// lengths and the connection's fate are the HTTP engine's; this decides what we do not want to see at all:
+/// above all what two readers could read differently (RFC 9112, sections 5.1, 5.2, 6.1 and 6.3), because such
+/// a reader may stand between the server and us.
 class ResponseHead final {
  public:
   /// Takes one line with its line end. What it finds stays found: later lines change nothing.
@@ -43,12 +47,17 @@ class ResponseHead final {
   HeadFault Judge(const std::string& line);
   HeadFault TakeStatusLine(const std::string& line);
   HeadFault TakeField(const std::string& line);
+  HeadFault TakeContentLength(const std::string& value);
+  HeadFault TakeTransferCoding(const std::string& value);
 
   std::size_t _bytes = 0;
   int _statusCode = 0;
   std::string _reason;
   bool _isComplete = false;
-  bool _hasLength = false;
+  bool _awaitsStatusLine = true;
+  bool _isHttp10 = false;
+  bool _hasContentLength = false;
+  bool _hasTransferCoding = false;
   HeadFault _fault = HeadFault::NONE;
 };
 

@@ -168,6 +168,10 @@ std::string DescribeRefusal(const TransferFacts& facts) {
       return facts.endpoint + " answered " + status + " with a content coding, though it was asked for none";
     case HeadFault::TRANSFER_CODING:
       return facts.endpoint + " answered " + status + " with a transfer coding other than chunked";
+    case HeadFault::BAD_FIELD:
+      return facts.endpoint + " answered " + status + " with a malformed header line";
+    case HeadFault::BODY_LENGTH:
+      return facts.endpoint + " answered " + status + " without a clear length of its body";
     case HeadFault::NONE:
       break;
   }
