@@ -3,6 +3,8 @@
 
 #include "quorlin/Failure.h"
 
+#include "quorlin/ConnectionAdvice.h"
+
 #include <pelmar/http/HttpException.h>
 #include <pelmar/xml/Parser.h>
 #include <quorlin/Exceptions.h>
@@ -54,8 +56,7 @@ ExitCode GetExitCode(const std::exception& e, ExitCode otherwise) {
 
 std::string GetAdvice(const std::exception& e) {
   if (Is<Quorlin::CommunicationException>(e)) {
-    return "Check the URL and that the service is running; for https, that --ca names the authority of its certificate "
-           "and that the URL's host is one that the certificate is for.";
+    return AdviseOnConnection(e.what());
   }
   if (Is<Quorlin::InvalidCredentialsException>(e)) {
     return "Check the user name and the password.";

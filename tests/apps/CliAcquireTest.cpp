@@ -162,8 +162,8 @@ TEST(CliAcquire, TrustsNoServerOfAnUnknownAuthority) {
   EXPECT_EQ(result.standardError,
             "quorlin: Certificate of 127.0.0.1 is not trusted: issuer CN=Quorlin development CA "
             "(CommunicationException)\n"
-            "Check the URL and that the service is running; for https, that --ca names the authority of its "
-            "certificate and that the URL's host is one that the certificate is for.\n");
+            "If that is the service's authority, name its certificate with --ca. If not, somebody may stand "
+            "between.\n");
 }
 
 TEST(CliAcquire, LeavesTheOldFileWhenThereIsNoToken) {
