@@ -5,6 +5,7 @@
 
 #include "support/HttpCalls.h"
 #include "support/LoopbackServer.h"
+#include "support/TemporaryDirectory.h"
 
 #include <pelmar/Exception.h>
 #include <pelmar/http/Client.h>
@@ -265,7 +266,7 @@ TEST(HttpClient, TakesStatusReasonAndBody) {
       {"HTTP/1.1 200 \r\nContent-Length: 2\r\n\r\nhi", "200 |hi"},
       {"HTTP/1.1 299 Odd but fine\r\nContent-Length: 2\r\n\r\nhi", "299 Odd but fine|hi"},
       {"HTTP/1.1 204 No Content\r\n\r\n", "204 No Content|"},
-      {"HTTP/1.1 204 No Content\r\nContent-Length: 2\r\n\r\nhi", "204 No Content|"},
+      {"HTTP/1.1 204 No Content\r\nContent-Length: 0\r\n\r\n", "204 No Content|"},
       {"HTTP/1.1 300 Multiple Choices\r\nContent-Length: 0\r\n\r\n", "300 Multiple Choices|"},
       {"HTTP/1.1 302 Found\r\nLocation: http://127.0.0.1:1/\r\nContent-Length: 0\r\n\r\n", "302 Found|"},
       {"HTTP/1.1 401 Unauthorized\r\nWWW-Authenticate: Basic realm=\"x\"\r\nContent-Length: 2\r\n\r\nno",
@@ -362,6 +363,26 @@ TEST(HttpClient, UsesNoProxyFromTheEnvironment) {
     ::unsetenv(name);
   }
   EXPECT_EQ(0U, proxy.CountConnections());
+}
+
+TEST(HttpClient, UsesNoCredentialsOfTheHomeDirectory) {
+  LoopbackServer server({AnswerAll(kHello)});
+  const TemporaryDirectory home;
+  const std::string file =
+      home.WriteFile(".netrc", "machine 127.0.0.1 login x password y\ndefault login x password y\n");
+  home.WriteFile("_netrc", "default login x password y\n");
+  home.WriteFile(".curlrc", "user = x:y\n");
+  const char* const before = std::getenv("HOME");
+  const std::string oldHome = before == nullptr ? "" : before;
+  ::setenv("HOME", home.GetPath().c_str(), 1);
+  ::setenv("CURL_HOME", home.GetPath().c_str(), 1);
+  ::setenv("NETRC", file.c_str(), 1);
+  EXPECT_EQ("200 OK|hello", Call(*MakeAgent(server.GetPort()), MakeGet("/")));
+  ::setenv("HOME", oldHome.c_str(), 1);
+  ::unsetenv("CURL_HOME");
+  ::unsetenv("NETRC");
+  EXPECT_EQ("GET / HTTP/1.1\r\nHost: " + server.GetEndpoint() + "\r\nAccept-Encoding: identity\r\n\r\n",
+            server.GetRecord(0).received);
 }
 
 // --- Connections ---

@@ -210,6 +210,16 @@ TEST(HttpFaults, RefusesAnswersWithTwoReadings) {
   EXPECT_EQ(coding, CallOnce(SendAndClose("HTTP/1.0 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n" + chunks)));
 }
 
+// By the standard there is none, and the bytes would be taken for the start of the next answer.
+TEST(HttpFaults, RefusesABodyThatMayNotBe) {
+  const std::string refusal =
+      "HttpException: PEER answered 204 No Content without a clear length of its body";
+  EXPECT_EQ(refusal, CallOnce(SendAndClose("HTTP/1.1 204 No Content\r\nContent-Length: 2\r\n\r\nhi")));
+  EXPECT_EQ(refusal,
+            CallOnce(SendAndClose(
+                "HTTP/1.1 204 No Content\r\nTransfer-Encoding: chunked\r\n\r\n2\r\nhi\r\n0\r\n\r\n")));
+}
+
 TEST(HttpFaults, RefusesHeaderLinesThatTheEngineCannotRead) {
   EXPECT_EQ("HttpException: PEER did not answer in HTTP/1",
             CallOnce(SendAndClose("HTTP/1.1 200 OK\r\nContent-Length: 5\r\nno colon\r\n\r\nhello")));

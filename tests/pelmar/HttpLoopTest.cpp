@@ -53,6 +53,24 @@ TEST(HttpLoop, TriesAgainWhenThePoolTakesNothing) {
   EXPECT_EQ(3, refusals);
 }
 
+TEST(HttpLoop, StartsNothingThatWasCancelledBefore) {
+  LoopbackServer server({[](ServerConnection& connection) {
+    connection.ReadRequest();
+    connection.Send("HTTP/1.1 200 OK\r\nContent-Length: 0\r\nConnection: close\r\n\r\n");
+    connection.Close();
+  }});
+  HttpLoop loop([](const boost::function<void()>& work) { work(); });
+  const Ref<Exchange> cancelled = MakeExchange(server.GetPort());
+  cancelled->Cancel();
+  loop.Submit(cancelled);
+  const Ref<Exchange> next = MakeExchange(server.GetPort());
+  loop.Submit(next);
+  EXPECT_TRUE(next->Wait(-1));
+  EXPECT_EQ("200 OK|", Describe(*next->GetResult()));
+  EXPECT_EQ(1U, server.CountConnections());
+  EXPECT_THROW(cancelled->GetResult(), HttpException);
+}
+
 TEST(HttpLoop, EndsWhatIsPendingWhenShutDown) {
   LoopbackServer server({[](ServerConnection& connection) {
     connection.AwaitPeerEnd();

@@ -314,6 +314,33 @@ TEST(HttpTls, GivesUpOnSilenceDuringTheHandshake) {
             CallPlain([](ServerConnection& connection) { connection.AwaitPeerEnd(); }, kSoon));
 }
 
+TEST(HttpTls, TakesAHandshakeInSingleBytes) {
+  for (const int version : {TLS1_2_VERSION, TLS1_3_VERSION}) {
+    TlsServerSettings settings(GetServerIdentity());
+    settings.maxVersion = version;
+    settings.inSingleBytes = true;
+    EXPECT_EQ("200 OK|hello", CallServer(settings, MakeContext(GetCa())));
+  }
+}
+
+TEST(HttpTls, GivesUpOnSilenceAnywhereInTheHandshake) {
+  for (const int version : {TLS1_2_VERSION, TLS1_3_VERSION}) {
+    // The record's header, the ServerHello, the certificate.
+    for (const std::size_t bytes : {1, 4, 20, 90, 200, 700}) {
+      TlsServerSettings settings(GetServerIdentity());
+      settings.maxVersion = version;
+      settings.inSingleBytes = true;
+      settings.bytesBeforeSilence = bytes;
+      LoopbackServer server(settings, {AnswerAndClose});
+      EXPECT_EQ("HttpTimeoutException: No answer from " + server.GetEndpoint() + " within 0.05 s",
+                Call(*MakeAgent(MakeSpec(server, MakeContext(GetCa()))), MakePost("/", "secret"), kSoon))
+          << version << ", " << bytes;
+      server.AwaitEnd(0);
+      EXPECT_EQ("", server.GetRecord(0).received);
+    }
+  }
+}
+
 TEST(HttpTls, CancelsDuringTheHandshake) {
   LoopbackServer server({[](ServerConnection& connection) {
     connection.AwaitPeerEnd();

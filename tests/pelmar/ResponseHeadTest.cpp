@@ -134,6 +134,15 @@ TEST(ResponseHead, TakesOneClearOpinionAboutTheBodysLength) {
   EXPECT_EQ(HeadFault::TRANSFER_CODING, Judge({"HTTP/1.0 200 OK\r\n", kChunked}));
 }
 
+TEST(ResponseHead, RefusesABodyWhereNoneMayBe) {
+  const std::string kNoContent = "HTTP/1.1 204 No Content\r\n";
+  EXPECT_EQ(HeadFault::NONE, Judge({kNoContent, "\r\n"}));
+  EXPECT_EQ(HeadFault::NONE, Judge({kNoContent, "Content-Length: 0\r\n", "\r\n"}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kNoContent, "Content-Length: 1\r\n", "\r\n"}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kNoContent, "Content-Length: 00100\r\n", "\r\n"}));
+  EXPECT_EQ(HeadFault::BODY_LENGTH, Judge({kNoContent, "Transfer-Encoding: chunked\r\n", "\r\n"}));
+}
+
 TEST(ResponseHead, KeepsItsFirstFault) {
   EXPECT_EQ(HeadFault::CONTENT_CODING, Judge({"HTTP/1.1 200 OK\r\n", "Content-Encoding: gzip\r\n",
                                               "Transfer-Encoding: gzip\r\n", "\r\n"}));

@@ -23,6 +23,7 @@
 #include "support/LoopbackServer.h"
 #include "support/Pki.h"
 #include "support/RecordingLogSink.h"
+#include "support/VirtualSlot.h"
 
 namespace Quorlin {
 namespace {
@@ -168,6 +169,14 @@ TEST_F(HttpsClientDeathTest, OutcomeWithoutErrorAndResponseIsAProgrammingError) 
 }
 
 // ---- Construction ----
+
+TEST(Transport, HasItsOperationsInTheAgreedSlots) {
+  using SendAsync = void (TransportSession::*)(const Request&, const ResponseCallback&,
+                                               Pelmar::Ref<Pelmar::System::ScheduledItem>&);
+  EXPECT_EQ(0, TestSupport::SlotOf(&Transport::CreateSession));
+  EXPECT_EQ(0, TestSupport::SlotOf(&TransportSession::SendRequest));
+  EXPECT_EQ(1, TestSupport::SlotOf(static_cast<SendAsync>(&TransportSession::SendRequestAsync)));
+}
 
 TEST(HttpsClient, HasTheTimeoutsThatCallersAreTold) {
   EXPECT_EQ(240000000, kServiceTimeoutMicroseconds);

@@ -15,7 +15,6 @@
 
 #include <csignal>
 #include <cstddef>
-#include <cstring>
 #include <functional>
 #include <future>
 #include <limits>
@@ -26,6 +25,7 @@
 #include "support/FakeSamlToken.h"
 #include "support/GoldenText.h"
 #include "support/Pki.h"
+#include "support/VirtualSlot.h"
 
 namespace Quorlin {
 namespace {
@@ -37,6 +37,7 @@ using TestSupport::FakeSamlToken;
 using TestSupport::MaskVolatile;
 using TestSupport::ReadGoldenText;
 using TestSupport::ReplaceAll;
+using TestSupport::SlotOf;
 
 constexpr TokenSpec::Confirmation kDefault = TokenSpec::CONFIRMATION_DEFAULT;
 constexpr TokenSpec::Confirmation kBearer = TokenSpec::CONFIRMATION_BEARER;
@@ -375,16 +376,6 @@ TEST(Request, KnowsTheActions) {
   EXPECT_STREQ(Request::RENEW, kRenewUri);
   EXPECT_STREQ(Request::VALIDATE, kValidateUri);
   EXPECT_STREQ(Request::CHALLANGE, kChallengeUri);
-}
-
-// Where a virtual operation stands in its class's table: a member pointer holds 1 + the offset (Itanium C++
-// ABI, 2.3).
-template <typename Member>
-std::ptrdiff_t SlotOf(Member member) {
-  std::ptrdiff_t offset = 0;
-  static_assert(sizeof member >= sizeof offset, "a member pointer starts with its offset");
-  std::memcpy(&offset, &member, sizeof offset);
-  return (offset - 1) / static_cast<std::ptrdiff_t>(sizeof(void*));
 }
 
 TEST(RequestBuilder, HasItsOperationsInTheAgreedSlots) {

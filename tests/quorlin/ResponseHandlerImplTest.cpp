@@ -19,6 +19,7 @@
 
 #include "quorlin/xmlReading.h"
 #include "support/ServiceAnswers.h"
+#include "support/VirtualSlot.h"
 
 namespace Quorlin {
 namespace {
@@ -201,6 +202,13 @@ TEST(ResponseHandlerImpl, HasAnExpectationForEveryDataFile) {
 }
 
 // ---- Beyond the data files ----
+
+TEST(ResponseHandler, HasItsOperationsInTheAgreedSlots) {
+  EXPECT_EQ(0, TestSupport::SlotOf(&ResponseHandler::HandleAcquireTokenResponse));
+  EXPECT_EQ(1, TestSupport::SlotOf(&ResponseHandler::HandleValidateSubjectResponse));
+  EXPECT_EQ(2, TestSupport::SlotOf(&ResponseHandler::HandleRenewTokenResponse));
+  EXPECT_EQ(3, TestSupport::SlotOf(&ResponseHandler::HandleSPNegoResponse));
+}
 
 TEST(ResponseHandlerImpl, TokenTextIsItsOwnCanonicalForm) {
   const std::string token = TestSupport::SignedToken("valid");

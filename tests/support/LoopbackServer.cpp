@@ -103,6 +103,30 @@ SSL_CTX* MakeTlsContext(const TlsServerSettings& settings) {
   return context;
 }
 
+int WriteToConnection(BIO* bio, const char* data, int size) {
+  auto* const connection = static_cast<ServerConnection*>(BIO_get_data(bio));
+  return connection->SendSlowly(data, static_cast<std::size_t>(size)) ? size : -1;
+}
+
+long ControlSlowBio(BIO*, int command, long, void*) {
+  return command == BIO_CTRL_FLUSH ? 1 : 0;
+}
+
+/// Sends through `connection`.
+BIO* MakeSlowBio(ServerConnection* connection) {
+  static BIO_METHOD* const method = [] {
+    BIO_METHOD* const made = BIO_meth_new(BIO_get_new_index() | BIO_TYPE_SOURCE_SINK, "slow");
+    BIO_meth_set_write(made, WriteToConnection);
+    BIO_meth_set_ctrl(made, ControlSlowBio);
+    return made;
+  }();
+  BIO* const bio = BIO_new(method);
+  Require(bio != nullptr, "no BIO");
+  BIO_set_data(bio, connection);
+  BIO_set_init(bio, 1);
+  return bio;
+}
+
 /// How many bytes of body the head announces.
 std::size_t ReadContentLength(const std::string& head) {
   const std::string name = "Content-Length: ";
@@ -119,7 +143,10 @@ void ServerConnection::TlsDeleter::operator()(SSL* tls) const noexcept {
 }
 
 ServerConnection::ServerConnection(LoopbackServer& server, std::size_t index, int socket)
-    : _server(server), _index(index), _socket(socket) {}
+    : _server(server),
+      _index(index),
+      _socket(socket),
+      _bytesBeforeSilence(server._tlsSettings ? server._tlsSettings->bytesBeforeSilence : 0) {}
 
 ServerConnection::~ServerConnection() {
   const std::lock_guard<std::mutex> lock(_server._mutex);
@@ -133,6 +160,9 @@ void ServerConnection::StartTls() {
   _tls.reset(SSL_new(_server._tlsContext.get()));
   Require(_tls != nullptr, "no TLS");
   SSL_set_fd(_tls.get(), _socket);
+  if (_server._tlsSettings->inSingleBytes) {
+    SSL_set0_wbio(_tls.get(), MakeSlowBio(this));
+  }
   const bool isSecured = SSL_accept(_tls.get()) == 1;
   const char* const name = SSL_get_servername(_tls.get(), TLSEXT_NAMETYPE_host_name);
   _server.Change(_index, [&](ConnectionRecord& record) {
@@ -146,6 +176,15 @@ void ServerConnection::StartTls() {
     CloseWithoutNotice();
     throw Broken();
   }
+}
+
+bool ServerConnection::SendSlowly(const char* data, std::size_t size) {
+  for (; size > 0 && _bytesBeforeSilence > 0; --size, --_bytesBeforeSilence) {
+    if (::send(_socket, data++, 1, MSG_NOSIGNAL) != 1) {
+      return false;
+    }
+  }
+  return true;
 }
 
 std::string ServerConnection::Receive() {
@@ -251,7 +290,7 @@ LoopbackServer::LoopbackServer(std::vector<Script> scripts) : _scripts(std::move
 }
 
 LoopbackServer::LoopbackServer(const TlsServerSettings& settings, std::vector<Script> scripts)
-    : _scripts(std::move(scripts)), _tlsContext(MakeTlsContext(settings)) {
+    : _scripts(std::move(scripts)), _tlsSettings(settings), _tlsContext(MakeTlsContext(settings)) {
   Listen();
 }
 

@@ -11,6 +11,7 @@
 #include <condition_variable>
 #include <cstddef>
 #include <functional>
+#include <limits>
 #include <list>
 #include <memory>
 #include <mutex>
@@ -47,6 +48,8 @@ class ServerConnection final {
 
   /// The server's side of the handshake, as the server's settings say.
   void StartTls();
+  /// For OpenSSL: sends byte by byte, and nothing after as many as the settings say. All is taken.
+  bool SendSlowly(const char* data, std::size_t size);
   /// Reads up to the end of one request: the empty line, and as many bytes as its Content-Length says.
   void ReadRequest();
   /// Reads at least one byte.
@@ -77,6 +80,7 @@ class ServerConnection final {
   struct TlsDeleter {
     void operator()(ssl_st* tls) const noexcept;
   };
+  std::size_t _bytesBeforeSilence;
   std::unique_ptr<ssl_st, TlsDeleter> _tls;
   std::string _unread;
 };
@@ -88,6 +92,9 @@ struct TlsServerSettings {
   std::vector<Identity> chain;       ///< Sent after the identity's own certificate.
   std::optional<Identity> clientCa;  ///< Demand a client certificate issued by it.
   int maxVersion = 0;                ///< One of OpenSSL's version numbers; 0: the newest.
+  bool inSingleBytes = false;        ///< Everything is sent byte by byte.
+  /// With inSingleBytes: after so many bytes of TLS nothing is sent any more.
+  std::size_t bytesBeforeSilence = std::numeric_limits<std::size_t>::max();
 };
 
 /// Runs one script per connection, each on a thread of its own, in the order in which the connections come.
@@ -131,6 +138,7 @@ class LoopbackServer final {
   void Change(std::size_t connection, const std::function<void(ConnectionRecord&)>& change);
 
   const std::vector<Script> _scripts;
+  const std::optional<TlsServerSettings> _tlsSettings;
   std::unique_ptr<ssl_ctx_st, TlsContextDeleter> _tlsContext;
   int _listener = -1;
   int _port = 0;

@@ -17,6 +17,7 @@ namespace {
 constexpr std::size_t kMinorVersionOffset = 7;
 constexpr std::size_t kStatusCodeOffset = 9;  // After "HTTP/1.x ".
 constexpr std::size_t kStatusCodeDigits = 3;
+constexpr int kNoContent = 204;
 
 bool IsDigit(char c) {
   return c >= '0' && c <= '9';
@@ -88,7 +89,6 @@ HeadFault ResponseHead::TakeLine(const char* line, std::size_t size) {
 }
 
 bool ResponseHead::IsEndedByConnection() const {
-  constexpr int kNoContent = 204;
   constexpr int kNotModified = 304;
   return _isComplete && !_hasContentLength && !_hasTransferCoding && _statusCode != kNoContent &&
          _statusCode != kNotModified;
@@ -102,9 +102,7 @@ HeadFault ResponseHead::Judge(const std::string& line) {
     return TakeStatusLine(line);
   }
   if (line.empty()) {
-    _awaitsStatusLine = IsInterim(_statusCode);
-    _isComplete = !_awaitsStatusLine;
-    return HeadFault::NONE;
+    return TakeEnd();
   }
   return TakeField(line);
 }
@@ -118,6 +116,12 @@ HeadFault ResponseHead::TakeStatusLine(const std::string& line) {
   _statusCode = std::stoi(line.substr(kStatusCodeOffset, kStatusCodeDigits));
   _reason = MaskControlCharacters(TrimBlanks(line.substr(kStatusCodeOffset + kStatusCodeDigits)));
   return HeadFault::NONE;
+}
+
+HeadFault ResponseHead::TakeEnd() {
+  _awaitsStatusLine = IsInterim(_statusCode);
+  _isComplete = !_awaitsStatusLine;
+  return _statusCode == kNoContent && _announcesBody ? HeadFault::BODY_LENGTH : HeadFault::NONE;
 }
 
 HeadFault ResponseHead::TakeField(const std::string& line) {
@@ -144,6 +148,7 @@ HeadFault ResponseHead::TakeContentLength(const std::string& value) {
   const bool isClear = !_hasContentLength && !_hasTransferCoding && !value.empty() &&
                        std::all_of(value.begin(), value.end(), IsDigit);
   _hasContentLength = true;
+  _announcesBody = _announcesBody || value.find_first_not_of('0') != std::string::npos;
   return isClear ? HeadFault::NONE : HeadFault::BODY_LENGTH;
 }
 
@@ -152,6 +157,7 @@ HeadFault ResponseHead::TakeTransferCoding(const std::string& value) {
     return HeadFault::TRANSFER_CODING;
   }
   _hasTransferCoding = true;
+  _announcesBody = true;
   return _hasContentLength ? HeadFault::BODY_LENGTH : HeadFault::NONE;
 }
 

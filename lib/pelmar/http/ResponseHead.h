@@ -19,7 +19,8 @@ enum class HeadFault {
   CONTENT_CODING,   ///< A Content-Encoding, though the request asked for none.
   TRANSFER_CODING,  ///< A Transfer-Encoding other than chunked, once, in HTTP/1.1.
   BAD_FIELD,        ///< A header line that is no name, colon and value, or that continues the one before.
-  BODY_LENGTH,  ///< More than one opinion about where the body ends, or a Content-Length that is no number.
+  BODY_LENGTH,  ///< More than one opinion about where the body ends, a Content-Length that is no number, or a
+                ///< body with 204.
 };
 
 /// Follows the lines of interim responses, the final one and trailers. Splitting the stream into lines, body
@@ -46,6 +47,7 @@ class ResponseHead final {
  private:
   HeadFault Judge(const std::string& line);
   HeadFault TakeStatusLine(const std::string& line);
+  HeadFault TakeEnd();
   HeadFault TakeField(const std::string& line);
   HeadFault TakeContentLength(const std::string& value);
   HeadFault TakeTransferCoding(const std::string& value);
@@ -58,6 +60,7 @@ class ResponseHead final {
   bool _isHttp10 = false;
   bool _hasContentLength = false;
   bool _hasTransferCoding = false;
+  bool _announcesBody = false;
   HeadFault _fault = HeadFault::NONE;
 };
 
