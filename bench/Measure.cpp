@@ -16,27 +16,27 @@ namespace {
 // speed.
 constexpr double kSampleMicroseconds = 2000;
 
-double ThreadMicroseconds() {
+double ReadMicroseconds(clockid_t clock) {
   timespec now = {};
-  if (clock_gettime(CLOCK_THREAD_CPUTIME_ID, &now) != 0) {
-    throw std::runtime_error("this system does not measure the processor time of a thread");
+  if (clock_gettime(clock, &now) != 0) {
+    throw std::runtime_error("this system does not measure processor time");
   }
   return static_cast<double>(now.tv_sec) * 1e6 + static_cast<double>(now.tv_nsec) / 1e3;
 }
 
 // The first call is not counted: it finds the processor's caches and predictions full of another row's work,
 // which is a matter of what was measured before and not of the row.
-double TimeOneCall(const Action& action, std::size_t calls) {
+double TimeOneCall(const Action& action, std::size_t calls, clockid_t clock) {
   action();
-  const double start = ThreadMicroseconds();
+  const double start = ReadMicroseconds(clock);
   for (std::size_t i = 0; i < calls; ++i) {
     action();
   }
-  return (ThreadMicroseconds() - start) / static_cast<double>(calls);
+  return (ReadMicroseconds(clock) - start) / static_cast<double>(calls);
 }
 
-std::size_t FindCallsPerSample(const Action& action) {
-  const double once = std::min(TimeOneCall(action, 1), TimeOneCall(action, 1));
+std::size_t FindCallsPerSample(const Action& action, clockid_t clock) {
+  const double once = std::min(TimeOneCall(action, 1, clock), TimeOneCall(action, 1, clock));
   return static_cast<std::size_t>(
       std::clamp(std::ceil(kSampleMicroseconds / std::max(once, 0.1)), 1.0, 10000.0));
 }
@@ -51,12 +51,13 @@ class RowTimer final {
  public:
   explicit RowTimer(const Row& row)
       : _row(row),
-        _subjectCalls(FindCallsPerSample(row.subject)),
-        _floorCalls(FindCallsPerSample(row.floor)) {}
+        _clock(row.countsAllThreads ? CLOCK_PROCESS_CPUTIME_ID : CLOCK_THREAD_CPUTIME_ID),
+        _subjectCalls(FindCallsPerSample(row.subject, _clock)),
+        _floorCalls(FindCallsPerSample(row.floor, _clock)) {}
 
   void TakeSample() {
-    _floors.push_back(TimeOneCall(_row.floor, _floorCalls));
-    _subjects.push_back(TimeOneCall(_row.subject, _subjectCalls));
+    _floors.push_back(TimeOneCall(_row.floor, _floorCalls, _clock));
+    _subjects.push_back(TimeOneCall(_row.subject, _subjectCalls, _clock));
     _ratios.push_back(_subjects.back() / _floors.back());
   }
 
@@ -64,6 +65,7 @@ class RowTimer final {
 
  private:
   const Row& _row;
+  const clockid_t _clock;
   const std::size_t _subjectCalls;
   const std::size_t _floorCalls;
   std::vector<double> _subjects;

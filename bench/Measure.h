@@ -21,9 +21,10 @@ struct Row {
   std::size_t bytes;  ///< Of the text that is read or made.
   Action subject;
   Action floor;
-  double limit;                ///< The largest ratio of the subject to its floor that `--check` lets pass.
-  double aim = 0;              ///< The ratio we work for; 0: none.
-  double aimMicroseconds = 0;  ///< The time we work for, on a machine of today; 0: none. Never checked.
+  double limit;                   ///< The largest ratio of the subject to its floor that `--check` lets pass.
+  double aim = 0;                 ///< The ratio we work for; 0: none.
+  double aimMicroseconds = 0;     ///< The time we work for, on a machine of today; 0: none. Never checked.
+  bool countsAllThreads = false;  ///< Both sides hand work to threads of their own.
 };
 
 /// Medians over all rounds. The ratio is the median of the rounds' ratios, so that a machine that changes its
@@ -35,8 +36,8 @@ struct Result {
 };
 
 /// One result for each row. Every round goes through all rows and takes the subject and its floor right after
-/// each other. What is counted is the processor time of this thread, so that other work on the machine does
-/// not count.
+/// each other. What is counted is the processor time of this thread, or of all threads of the process for
+/// rows that ask for it, so that other work on the machine does not count.
 std::vector<Result> MeasureInterleaved(const std::vector<Row>& rows, std::size_t rounds);
 
 }  // namespace Bench

@@ -25,6 +25,8 @@ Section MakeValidationSection();
 Section MakeStepsSection();
 Section MakeSignedRequestsSection();
 Section MakeUnsignedRequestsSection();
+/// Starts a server. Make it before anything starts a thread.
+Section MakeHttpsSection();
 
 }  // namespace Bench
 
