@@ -4,6 +4,7 @@
 # The settings a person may choose. Inside another project only the libraries are built unless asked otherwise.
 
 option(QUORLIN_BUILD_APPS "Build the command-line tool and the development token service" ${PROJECT_IS_TOP_LEVEL})
+option(QUORLIN_BUILD_DEVSTS "Build the development token service alone, as a library to test one's own code with" OFF)
 option(QUORLIN_BUILD_TESTS "Build the tests and the checks of the public headers" ${PROJECT_IS_TOP_LEVEL})
 option(QUORLIN_BUILD_BENCH "Build the benchmarks" ${PROJECT_IS_TOP_LEVEL})
 option(QUORLIN_BUILD_FUZZ "Build the fuzz targets" ${PROJECT_IS_TOP_LEVEL})

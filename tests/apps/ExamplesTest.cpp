@@ -4,19 +4,27 @@
 // The example programs, run as their users would run them, and the README's code, which is cut from one of
 // them.
 
+#include "support/Pki.h"
 #include "support/Process.h"
 #include "support/TemporaryDirectory.h"
 
 #include "devsts/Service.h"
 
+#include <pelmar/crypto/Digest.h>
+#include <quorlin/quorlin.h>
+
 #include <gtest/gtest.h>
 
 #include <fstream>
 #include <iterator>
+#include <regex>
 #include <sstream>
 #include <string>
+#include <vector>
 
 namespace {
+
+using TestSupport::ProcessResult;
 
 std::string ReadProjectFile(const std::string& name) {
   const std::string path = std::string(QUORLIN_PROJECT_DIR) + "/" + name;
@@ -25,13 +33,120 @@ std::string ReadProjectFile(const std::string& name) {
   return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
 
-TestSupport::ProcessResult AcquireByPassword(const DevSts::Service& service, const std::string& password) {
-  const TestSupport::TemporaryDirectory directory;
-  return TestSupport::RunProcess(
-      {std::string(QUORLIN_EXAMPLES_DIR) + "/acquireByPassword", service.GetUrl(),
-       directory.WriteFile("ca.pem", service.GetCaCertificate()),
-       directory.WriteFile("sts.pem", service.GetSigningCertificate()), "alice@example.com"},
-      password + "\n");
+std::string GetExamplePath(const std::string& name) {
+  return std::string(QUORLIN_EXAMPLES_DIR) + "/" + name;
+}
+
+/// A running service, and the files that its clients need.
+class World final {
+ public:
+  explicit World(const DevSts::ServiceConfig& config = DevSts::ServiceConfig()) : _service(config) {
+    WriteFile("ca.pem", _service.GetCaCertificate());
+    WriteFile("sts.pem", _service.GetSigningCertificate());
+  }
+
+  /// Runs an example that takes URL, CA.pem and STS.pem first.
+  ProcessResult RunClient(const std::string& name, const std::vector<std::string>& more,
+                          const std::string& standardInput) const {
+    std::vector<std::string> command = {GetExamplePath(name), _service.GetUrl(), GetPath("ca.pem"),
+                                        GetPath("sts.pem")};
+    command.insert(command.end(), more.begin(), more.end());
+    return TestSupport::RunProcess(command, standardInput);
+  }
+
+  std::string GetPath(const std::string& name) const { return _files.GetPath(name); }
+  std::string WriteFile(const std::string& name, const std::string& content) const {
+    return _files.WriteFile(name, content);
+  }
+  DevSts::Service& GetService() { return _service; }
+
+  /// Set up with the client's own key, if `identity` is given.
+  Quorlin::SecurityTokenServiceConfig MakeClientConfig(
+      const TestSupport::Identity* identity = nullptr) const {
+    Pelmar::Ssl::SSLContextOptions tls;
+    tls.caFile = GetPath("ca.pem");
+    Quorlin::SecurityTokenServiceConfig config;
+    config.stsUrl = _service.GetUrl();
+    config.sslContext = Pelmar::Ssl::CreateSSLContext(tls);
+    config.trustedStsCertificates =
+        Pelmar::Crypto::CreateCertificatesFromPem(_service.GetSigningCertificate());
+    if (identity != nullptr) {
+      config.holderOfKeyConfig = Quorlin::HolderOfKeyConfig{identity->GetKey(), identity->certificate};
+    }
+    return config;
+  }
+
+ private:
+  DevSts::Service _service;
+  TestSupport::TemporaryDirectory _files;
+};
+
+ProcessResult AcquireByPassword(const World& world, const std::string& password) {
+  return world.RunClient("acquireByPassword", {"alice@example.com"}, password + "\n");
+}
+
+/// Each match of `pattern` replaced by `mask`.
+std::string Mask(const std::string& text, const std::string& pattern, const std::string& mask) {
+  return std::regex_replace(text, std::regex(pattern), mask);
+}
+
+constexpr const char* kDatePattern = "[0-9]{4}-[0-9]{2}-[0-9]{2}T[0-9:.]*Z";
+constexpr const char* kUuidPattern = "_?[0-9a-f]{8}(-[0-9a-f]{4}){3}-[0-9a-f]{12}";
+
+TestSupport::Identity MakeRobot() {
+  TestSupport::CertificateSpec spec;
+  spec.commonName = "robot";
+  return TestSupport::MakeSelfSigned(spec);
+}
+
+DevSts::ServiceConfig MakeConfigWith(const TestSupport::Identity& identity) {
+  DevSts::User robot;
+  robot.name = "robot";
+  robot.domain = "example.com";
+  robot.certificates = {Pelmar::Crypto::ToHex(identity.certificate->GetSha256())};
+  DevSts::ServiceConfig config;
+  config.directory = DevSts::Directory({robot});
+  return config;
+}
+
+/// A service that knows robot by certificate, and robot's files.
+class RobotWorld final {
+ public:
+  RobotWorld() : _identity(MakeRobot()), _world(MakeConfigWith(_identity)) {
+    _world.WriteFile("cert.pem", _identity.GetCertificatePem());
+    _world.WriteFile("key.pem", _identity.GetKeyPem());
+  }
+
+  ProcessResult Renew(long long lifetimeSec, const std::string& work) const {
+    return _world.RunClient(
+        "renewHolderOfKey",
+        {_world.GetPath("cert.pem"), _world.GetPath("key.pem"), std::to_string(lifetimeSec)}, work);
+  }
+
+  const TestSupport::Identity& GetIdentity() const { return _identity; }
+  World& GetWorld() { return _world; }
+
+ private:
+  TestSupport::Identity _identity;
+  World _world;
+};
+
+/// The validating server's verdict on `token`, for which it needs the service's certificate alone.
+ProcessResult ValidateReceived(const World& world, const std::string& token,
+                               const std::vector<std::string>& more = {}) {
+  std::vector<std::string> command = {GetExamplePath("validateReceivedToken"), world.GetPath("sts.pem"),
+                                      "urn:example:files"};
+  command.insert(command.end(), more.begin(), more.end());
+  return TestSupport::RunProcess(command, token);
+}
+
+std::string AcquireFor(const World& world, const std::string& audience) {
+  Quorlin::TokenSpec spec;
+  spec.tokenLifetimeSec = 600;
+  spec.audienceRestriction = {audience};
+  return Quorlin::CreateSecurityTokenService(world.MakeClientConfig())
+      ->AcquireToken("alice@example.com", "secret", spec)
+      ->ToXml();
 }
 
 // The lines between the two markers, with the indentation of the first taken off each.
@@ -53,8 +168,8 @@ std::string CutSnippet(const std::string& source) {
 }
 
 TEST(Examples, AcquireByPasswordPrintsWhomTheTokenIsFor) {
-  const DevSts::Service service{DevSts::ServiceConfig()};
-  const TestSupport::ProcessResult result = AcquireByPassword(service, "secret");
+  const World world;
+  const ProcessResult result = AcquireByPassword(world, "secret");
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(result.standardError, "");
   const std::string end = "Z\n";
@@ -65,11 +180,180 @@ TEST(Examples, AcquireByPasswordPrintsWhomTheTokenIsFor) {
 }
 
 TEST(Examples, AcquireByPasswordSaysWhyThereIsNoToken) {
-  const DevSts::Service service{DevSts::ServiceConfig()};
-  const TestSupport::ProcessResult result = AcquireByPassword(service, "wrong");
+  const World world;
+  const ProcessResult result = AcquireByPassword(world, "wrong");
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.standardOutput, "");
   EXPECT_EQ(result.standardError, "Authentication failed: Invalid user name or password\n");
+}
+
+TEST(Examples, RenewHolderOfKeyRenewsATokenThatWillSoonEnd) {
+  const RobotWorld robot;
+  const ProcessResult result = robot.Renew(30, "sweep\nmow\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(Mask(result.standardOutput, kUuidPattern, "ID"),
+            "acquired ID\n"
+            "sweep as {Name: robot; Domain:example.com}\n"
+            "renewed ID\n"
+            "mow as {Name: robot; Domain:example.com}\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, RenewHolderOfKeyKeepsATokenThatHoldsLongEnough) {
+  const RobotWorld robot;
+  const ProcessResult result = robot.Renew(600, "sweep\nmow\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(Mask(result.standardOutput, kUuidPattern, "ID"),
+            "acquired ID\n"
+            "sweep as {Name: robot; Domain:example.com}\n"
+            "mow as {Name: robot; Domain:example.com}\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, RenewHolderOfKeySaysThatTheLifetimeIsBad) {
+  const RobotWorld robot;
+  const ProcessResult result = robot.Renew(0, "sweep\n");
+  EXPECT_EQ(result.standardError, "Invalid argument : Token lifetime must be positive\n");
+  EXPECT_EQ(result.standardOutput, "");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, ValidateReceivedTokenWelcomesTheSubject) {
+  const World world;
+  const ProcessResult result = ValidateReceived(world, AcquireFor(world, "urn:example:files"));
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(result.standardOutput,
+            "welcome {Name: alice; Domain:example.com}\n"
+            "group {Name: Administrators; Domain:example.com}\n"
+            "group {Name: Staff; Domain:example.com}\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, ValidateReceivedTokenRefusesATokenForAnotherService) {
+  const World world;
+  const ProcessResult result = ValidateReceived(world, AcquireFor(world, "urn:example:mail"));
+  EXPECT_EQ(result.standardError, "refused: the token is for another service\n");
+  EXPECT_EQ(result.standardOutput, "");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, ValidateReceivedTokenRefusesAChangedToken) {
+  const World world;
+  const std::string token = Mask(AcquireFor(world, "urn:example:files"), "alice@", "admin@");
+  const ProcessResult result = ValidateReceived(world, token);
+  EXPECT_EQ(result.standardError,
+            "refused: Failed to verify signature: token might have been tampered with.\n");
+  EXPECT_EQ(result.standardOutput, "");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, ValidateReceivedTokenRefusesWhatIsNotXml) {
+  const World world;
+  const ProcessResult result = ValidateReceived(world, "hello");
+  EXPECT_EQ(result.standardError, "refused: syntax error at line 1, column 1\n");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+// The bad set-up of a server is not the fault of the token.
+TEST(Examples, ValidateReceivedTokenTellsAMissingCertificateFromABadToken) {
+  const TestSupport::TemporaryDirectory files;
+  const std::string path = files.GetPath("none.pem");
+  const ProcessResult result =
+      TestSupport::RunProcess({GetExamplePath("validateReceivedToken"), path, "urn:example:files"}, "");
+  EXPECT_EQ(result.standardError, "cannot read " + path + "\n");
+  EXPECT_EQ(result.exitCode, 2);
+}
+
+TEST(Examples, ValidateReceivedTokenAsksTheHolderForTheKey) {
+  RobotWorld robot;
+  const World& world = robot.GetWorld();
+  Quorlin::TokenSpec spec;
+  spec.tokenLifetimeSec = 600;
+  const std::string token = Quorlin::CreateSecurityTokenService(world.MakeClientConfig(&robot.GetIdentity()))
+                                ->AcquireTokenByCertificate(spec)
+                                ->ToXml();
+
+  const ProcessResult nobody = ValidateReceived(world, token);
+  EXPECT_EQ(nobody.standardError, "refused: the client has not proved to hold the token's key\n");
+  EXPECT_EQ(nobody.exitCode, 1);
+  const ProcessResult other = ValidateReceived(world, token, {world.GetPath("sts.pem")});
+  EXPECT_EQ(other.standardError, "refused: the client has not proved to hold the token's key\n");
+  EXPECT_EQ(other.exitCode, 1);
+  const ProcessResult holder = ValidateReceived(world, token, {world.GetPath("cert.pem")});
+  EXPECT_EQ(holder.standardError, "");
+  EXPECT_EQ(holder.standardOutput, "welcome {Name: robot; Domain:example.com}\n");
+  EXPECT_EQ(holder.exitCode, 0);
+}
+
+TEST(Examples, AcquireAsyncGetsTheTokensOfAllUsers) {
+  const World world;
+  const ProcessResult result =
+      world.RunClient("acquireAsync", {}, "alice@example.com secret\nbob@example.com builder\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(result.standardOutput,
+            "alice@example.com: {Name: alice; Domain:example.com}\n"
+            "bob@example.com: {Name: bob; Domain:example.com}\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, AcquireAsyncSaysWhoGotNoToken) {
+  const World world;
+  const ProcessResult result =
+      world.RunClient("acquireAsync", {}, "alice@example.com wrong\nbob@example.com builder\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(result.standardOutput,
+            "alice@example.com: no token: Authentication failed: Invalid user name or password\n"
+            "bob@example.com: {Name: bob; Domain:example.com}\n");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, LogSinkWritesTheLinesOfAnOperationAsJson) {
+  const World world;
+  const ProcessResult result = world.RunClient("logSink", {"alice@example.com"}, "secret\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(
+      Mask(Mask(result.standardOutput, kDatePattern, "DATE"), kUuidPattern, "UUID"),
+      "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"opId=UUID START operation "
+      "SecurityTokenServiceImpl::AcquireToken\"}\n"
+      "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"Requested token for subject "
+      "`alice@example.com', spec `TokenSpec [tokenLifetimeSec=600, delegable=false, delegateTo=<unset>, "
+      "renewable=false, confirmationType=0,audienceRestriction=, advice=[]'\"}\n"
+      "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"SecurityTokenServiceImpl::"
+      "AcquireToken sending request\"}\n"
+      "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"SecurityTokenServiceImpl::"
+      "AcquireToken processing response\"}\n"
+      "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"Successfully acquired token: SamlToken "
+      "[subject={Name: alice; Domain:example.com}, groups=[{Name: Administrators; Domain:example.com}, "
+      "{Name: Staff; Domain:example.com}], delegationChain=[], startTime=DATE, expirationTime=DATE, "
+      "renewable=false, delegable=false, isSolution=false,confirmationType=0]\"}\n"
+      "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"opId=UUID END operation "
+      "SecurityTokenServiceImpl::AcquireToken\"}\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+// What comes from outside must not make a second line, nor end the string it stands in.
+TEST(Examples, LogSinkEscapesWhatCouldForgeALine) {
+  const World world;
+  const ProcessResult result = world.RunClient("logSink", {"a\n\"b\x1b"}, "secret\n");
+  std::istringstream lines(result.standardOutput);
+  std::string line;
+  std::getline(lines, line);
+  std::getline(lines, line);
+  EXPECT_EQ(Mask(line, kDatePattern, "DATE"),
+            "{\"time\":\"DATE\",\"level\":64,\"logger\":\"Quorlin\",\"text\":\"Requested token for subject "
+            "`a\\u000a\\\"b\\u001b', spec `TokenSpec [tokenLifetimeSec=600, delegable=false, "
+            "delegateTo=<unset>, renewable=false, confirmationType=0,audienceRestriction=, advice=[]'\"}");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, TestAgainstDevStsPasses) {
+  const ProcessResult result =
+      TestSupport::RunProcess({GetExamplePath("testAgainstDevSts"), "--gtest_color=no", "--gtest_brief=1"});
+  EXPECT_EQ(result.standardError, "");
+  const std::string verdict = "[  PASSED  ] 5 tests.\n";
+  ASSERT_GE(result.standardOutput.size(), verdict.size());
+  EXPECT_EQ(result.standardOutput.substr(result.standardOutput.size() - verdict.size()), verdict);
+  EXPECT_EQ(result.exitCode, 0);
 }
 
 TEST(Readme, ShowsTheCodeOfTheExample) {
