@@ -22,17 +22,6 @@ constexpr unsigned kMaxRenewCount = 10;
 /// Longer than any message is taken as fresh.
 constexpr long long kReplayMemory = 2 * 60 * 60 * kMicrosecondsPerSecond;
 
-Caller MakeCaller(const User& user, const char* authnContext, const AuthenticationContext& context) {
-  context.record.SetUser(user.GetUpn());
-  Caller caller;
-  caller.user = &user;
-  caller.authnContext = authnContext;
-  caller.authenticated = context.now;
-  caller.proxyCount = kMaxProxyCount;
-  caller.renewCount = kMaxRenewCount;
-  return caller;
-}
-
 void RequireFirst(const SecurityHeader& header, const AuthenticationContext& context) {
   if (!context.replays.IsFirst(GetSignatureValue(header), context.now + kReplayMemory, context.now)) {
     throw Fault(FaultCode::FAILED_AUTHENTICATION, "The message was sent before");
@@ -117,6 +106,17 @@ Caller AuthenticateByToken(const SoapMessage& message, const SecurityHeader& hea
 }
 
 }  // namespace
+
+Caller MakeCaller(const User& user, const std::string& authnContext, const AuthenticationContext& context) {
+  context.record.SetUser(user.GetUpn());
+  Caller caller;
+  caller.user = &user;
+  caller.authnContext = authnContext;
+  caller.authenticated = context.now;
+  caller.proxyCount = kMaxProxyCount;
+  caller.renewCount = kMaxRenewCount;
+  return caller;
+}
 
 void RequireProofOfKey(const SoapMessage& message, const SecurityHeader& header,
                        const AuthenticationContext& context) {

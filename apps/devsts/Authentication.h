@@ -56,6 +56,9 @@ struct AuthenticationContext {
 Caller Authenticate(const SoapMessage& message, const SecurityHeader& header,
                     const AuthenticationContext& context);
 
+/// `user` as somebody who has just been authenticated, without proof of a key.
+Caller MakeCaller(const User& user, const std::string& authnContext, const AuthenticationContext& context);
+
 /// Checks that the message is signed with the key of the certificate it carries, and that it is no copy of an
 /// earlier one. This proves that the sender holds the key, not who the sender is. Throws Fault.
 void RequireProofOfKey(const SoapMessage& message, const SecurityHeader& header,

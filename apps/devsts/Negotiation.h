@@ -1,10 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-// What the service needs of a mechanism that proves who a client is in several legs (WS-Trust 1.3, section 8).
+// What the service needs of a mechanism that proves who a client is in several legs (WS-Trust 1.3, section
+// 8).
 
 #ifndef QUORLIN_DEVSTS_NEGOTIATION_H
 #define QUORLIN_DEVSTS_NEGOTIATION_H
+
+#include "devsts/Assertion.h"
 
 #include <cstdint>
 #include <memory>
@@ -36,6 +39,9 @@ class NegotiationMechanism {
  public:
   virtual ~NegotiationMechanism() = default;
   virtual std::unique_ptr<Negotiation> Begin() const = 0;
+  /// What the tokens say of how their subject was authenticated (SAML 2.0 Authentication Context,
+  /// section 3.4).
+  virtual std::string GetAuthnContext() const { return kKerberosContext; }
 };
 
 }  // namespace DevSts

@@ -64,7 +64,8 @@ RequestHandler::RequestHandler(const HandlerOptions& options, const Directory& d
       _directory(std::make_shared<const Directory>(directory)),
       _issuer(issuer),
       _clock(clock),
-      _log(log) {}
+      _log(log),
+      _negotiator(options.negotiation) {}
 
 Answer RequestHandler::HandleRequest(const std::string& soapAction, const std::string& contentType,
                                      const std::string& body) {
@@ -104,12 +105,17 @@ std::string RequestHandler::Process(const std::string& soapAction, const std::st
   RequireFresh(header, now, _options.maxClockSkewSec * kMicrosecondsPerSecond);
   record.AddPassed("timestamp");
   const TokenRequest request = ReadTokenRequest(*message.request, operation);
-  if (request.binaryExchange) {
-    throw Fault(FaultCode::REQUEST_FAILED, "Negotiation is not supported");
-  }
   const std::shared_ptr<const Directory> directory = GetDirectory();
   const AuthenticationContext context = {*directory, _issuer.GetCertificate(), _replays, now, record};
-  switch (operation) {
+  return Dispatch(message, header, request, context);
+}
+
+std::string RequestHandler::Dispatch(const SoapMessage& message, const SecurityHeader& header,
+                                     const TokenRequest& request, const AuthenticationContext& context) {
+  if (request.binaryExchange) {
+    return Negotiate(message, header, request, context);
+  }
+  switch (request.operation) {
     case Operation::RENEW:
       return Renew(message, header, request, context);
     case Operation::VALIDATE:
@@ -124,6 +130,22 @@ std::string RequestHandler::Issue(const SoapMessage& message, const SecurityHead
   const Caller caller = Authenticate(message, header, context);
   const AssertionContent content = Grant(caller, request, _options.lifetime, context.directory, context.now);
   return MakeIssueResponse({_issuer.Issue(content), content.notBefore, content.notOnOrAfter});
+}
+
+/// One round of a negotiation. What is granted is what its first message asked for.
+std::string RequestHandler::Negotiate(const SoapMessage& message, const SecurityHeader& header,
+                                      const TokenRequest& request, const AuthenticationContext& context) {
+  const NegotiationRound round = request.operation == Operation::CHALLENGE
+                                     ? _negotiator.Continue(header, request, context)
+                                     : _negotiator.Start(message, header, request, context);
+  const std::string leg = Pelmar::StringUtil::Base64Encode(round.leg);
+  if (!round.caller) {
+    return MakeChallengeResponse(round.context, leg);
+  }
+  const AssertionContent content =
+      Grant(*round.caller, round.wishes, _options.lifetime, context.directory, context.now);
+  return MakeNegotiatedResponse(round.context, leg,
+                                {_issuer.Issue(content), content.notBefore, content.notOnOrAfter});
 }
 
 /// Whoever holds the key that the token is bound to may renew it.

@@ -10,6 +10,7 @@
 #include "devsts/Clock.h"
 #include "devsts/Directory.h"
 #include "devsts/Grant.h"
+#include "devsts/Negotiator.h"
 #include "devsts/RequestLog.h"
 #include "devsts/TokenIssuer.h"
 #include "devsts/TokenRequest.h"
@@ -31,6 +32,8 @@ struct HandlerOptions {
   LifetimeLimits lifetime;
   /// By how many seconds a client's clock may differ.
   long long maxClockSkewSec = 5 * 60;
+  /// How clients may negotiate; empty: not at all.
+  std::shared_ptr<const NegotiationMechanism> negotiation;
 };
 
 /// The service's logic. Safe to use from any thread.
@@ -54,6 +57,10 @@ class RequestHandler final {
   Answer Respond(const std::string& soapAction, const std::string& contentType, const std::string& body,
                  RequestRecord& record);
   std::string Process(const std::string& soapAction, const std::string& body, RequestRecord& record);
+  std::string Dispatch(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
+                       const AuthenticationContext& context);
+  std::string Negotiate(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
+                        const AuthenticationContext& context);
   std::string Issue(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
                     const AuthenticationContext& context);
   std::string Renew(const SoapMessage& message, const SecurityHeader& header, const TokenRequest& request,
@@ -67,6 +74,7 @@ class RequestHandler final {
   Clock _clock;
   LogSink _log;
   ReplayGuard _replays;
+  Negotiator _negotiator;
 };
 
 }  // namespace DevSts

@@ -13,6 +13,7 @@
 
 #include "devsts/Secret.h"
 #include "devsts/Service.h"
+#include "devsts/ToyNegotiation.h"
 
 #include <filesystem>
 #include <iostream>
@@ -32,6 +33,7 @@ struct StsArguments {
   std::string certificateDirectory;
   std::string signingKeyFile;
   std::string signingCertificateFile;
+  unsigned toyLegs = 0;
 };
 
 /// One write per line, so that lines of several requests do not mix.
@@ -71,6 +73,12 @@ DevSts::ServiceConfig MakeConfig(const StsArguments& arguments) {
   }
   if (!arguments.signingKeyFile.empty()) {
     config.signer = ReadSigner(arguments);
+  }
+  if (arguments.toyLegs != 0) {
+    DevSts::ToyOptions options;
+    options.legs = arguments.toyLegs;
+    config.handler.negotiation = std::make_shared<DevSts::ToyMechanism>(
+        options, config.directory, DevSts::MakeSystemClock(config.clockOffsetSec));
   }
   return config;
 }
@@ -158,6 +166,12 @@ Command AddStsCommand(CLI::App& app) {
                    "Let the service's clock be ahead (negative: behind)")
       ->type_name("SEC")
       ->check(CLI::Range(-100LL * 365 * 24 * 60 * 60, 100LL * 365 * 24 * 60 * 60));
+  command
+      ->add_option(
+          "--toy-negotiation", arguments->toyLegs,
+          "Let clients negotiate (SPNEGO) by a toy mechanism of so many legs; safe for nothing but tests")
+      ->type_name("LEGS")
+      ->check(CLI::Range(1U, DevSts::kMaxToyLegs));
   command->footer(
       "Prints one JSON line when it is ready: {\"url\":...,\"ca\":...,\"stsCert\":...}. Writes one JSON line for each\n"
       "request to standard error. Ends on Ctrl-C.\n\n"

@@ -6,6 +6,10 @@
 #include "apps/ChildProcess.h"
 #include "apps/Cli.h"
 
+#include "quorlin/ToyNegotiationHandler.h"
+
+#include <quorlin/quorlin.h>
+
 #include <nlohmann/json.hpp>
 
 #include <gtest/gtest.h>
@@ -13,6 +17,8 @@
 #include <algorithm>
 #include <csignal>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <regex>
 #include <string>
 #include <vector>
@@ -149,6 +155,46 @@ TEST(CliSts, RefusesASigningKeyOfAnotherCertificate) {
   EXPECT_EQ(result.exitCode, 2);
   EXPECT_EQ(result.standardError,
             "quorlin: the signing certificate is not that of the signing key (UsageException)\n");
+}
+
+std::string ReadFile(const std::string& path) {
+  std::ifstream file(path);
+  return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
+}
+
+/// A client of `sts` inside this process.
+boost::shared_ptr<Quorlin::SecurityTokenService> Connect(const RunningSts& sts) {
+  Pelmar::Ssl::SSLContextOptions options;
+  options.trustAnchors = Pelmar::Crypto::CreateCertificatesFromPem(ReadFile(sts.ready.at("ca")));
+  Quorlin::SecurityTokenServiceConfig config;
+  config.stsUrl = sts.ready.at("url");
+  config.sslContext = Pelmar::Ssl::CreateSSLContext(options);
+  config.trustedStsCertificates =
+      Pelmar::Crypto::CreateCertificatesFromPem(ReadFile(sts.ready.at("stsCert")));
+  return Quorlin::CreateSecurityTokenService(config);
+}
+
+Quorlin::TokenSpec TenMinutes() {
+  Quorlin::TokenSpec spec;
+  spec.tokenLifetimeSec = 600;
+  return spec;
+}
+
+TEST(CliSts, NegotiatesByTheToyMechanismWhenTold) {
+  const RunningSts sts({"sts", "--toy-negotiation", "4"});
+  DevSts::ToyOptions options;
+  options.legs = 4;
+  Cli::ToyNegotiationHandler handler(options, "bob@example.com", "builder");
+  EXPECT_EQ(Connect(sts)->AcquireTokenByGSS(TenMinutes(), handler)->GetSubject().name, "bob");
+}
+
+TEST(CliSts, RefusesAToyMechanismOfNoLegsOrTooMany) {
+  for (const char* const legs : {"0", "101"}) {
+    const ProcessResult result = RunCli({"sts", "--toy-negotiation", legs});
+    EXPECT_EQ(result.exitCode, 2);
+    EXPECT_EQ(result.standardError, std::string("quorlin: --toy-negotiation: Value ") + legs +
+                                        " not in range 1 to 100\nTry quorlin sts --help\n");
+  }
 }
 
 TEST(CliDemo, TellsTheStory) {
