@@ -2,7 +2,8 @@
 # Copyright the Quorlin authors
 #
 # The installed package: find_package(Quorlin) gives Quorlin::quorlin and Pelmar::pelmar, pkg-config gives quorlin and
-# pelmar. Two CMake packages, because the platform stands on its own.
+# pelmar. Two CMake packages, because the platform stands on its own. With the component gssapi there is Quorlin::gssapi
+# too, or quorlin-gssapi.
 
 include(CMakePackageConfigHelpers)
 
@@ -11,33 +12,44 @@ file(RELATIVE_PATH pc_to_prefix "/prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/pr
 string(REGEX REPLACE "/$" "" pc_to_prefix "${pc_to_prefix}")
 if(QUORLIN_LIBRARY_TYPE STREQUAL "STATIC")
   set(pc_pelmar_requires "expat openssl >= 3.0 libcurl >= 7.87")
+  set(pc_gssapi_requires "krb5-gssapi >= 1.18")
 endif()
 
+# quorlin_install_target(<target> <name> <package> <export> <component>): library, headers and .pc file of one library, and its
+# imported target in <export>.cmake of <package>. The shared library itself goes into the Debian package <component>.
+function(quorlin_install_target target name package export component)
+  install(TARGETS ${target} EXPORT ${export}
+    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT ${component} NAMELINK_COMPONENT development
+    ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT development
+    FILE_SET HEADERS DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}" COMPONENT development)
+  install(EXPORT ${export} NAMESPACE ${package}:: DESTINATION "${CMAKE_INSTALL_LIBDIR}/cmake/${package}"
+    COMPONENT development)
+
+  set(generated_pc "${PROJECT_BINARY_DIR}/package/${name}.pc")
+  configure_file("${PROJECT_SOURCE_DIR}/cmake/${name}.pc.in" "${generated_pc}" @ONLY)
+  install(FILES "${generated_pc}" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)
+endfunction()
+
+# quorlin_install_library(<target> <name> <package>): a library that is a CMake package of its own.
 function(quorlin_install_library target name package)
   set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/${package}")
   set(generated_dir "${PROJECT_BINARY_DIR}/package")
-
-  install(TARGETS ${target} EXPORT ${package}Targets
-    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT runtime NAMELINK_COMPONENT development
-    ARCHIVE DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT development
-    FILE_SET HEADERS DESTINATION "${CMAKE_INSTALL_INCLUDEDIR}" COMPONENT development)
-  install(EXPORT ${package}Targets NAMESPACE ${package}:: DESTINATION "${package_dir}" COMPONENT development)
+  quorlin_install_target(${target} ${name} ${package} ${package}Targets runtime)
 
   configure_package_config_file("${PROJECT_SOURCE_DIR}/cmake/${package}Config.cmake.in"
     "${generated_dir}/${package}Config.cmake" INSTALL_DESTINATION "${package_dir}")
   # Before 1.0 a minor version may change the interface.
   write_basic_package_version_file("${generated_dir}/${package}ConfigVersion.cmake"
     VERSION ${PROJECT_VERSION} COMPATIBILITY SameMinorVersion)
-  configure_file("${PROJECT_SOURCE_DIR}/cmake/${name}.pc.in" "${generated_dir}/${name}.pc" @ONLY)
-
   install(FILES "${generated_dir}/${package}Config.cmake" "${generated_dir}/${package}ConfigVersion.cmake"
     DESTINATION "${package_dir}" COMPONENT development)
-  install(FILES "${generated_dir}/${name}.pc"
-    DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)
 endfunction()
 
 quorlin_install_library(pelmar_library pelmar Pelmar)
 quorlin_install_library(quorlin_library quorlin Quorlin)
+if(TARGET quorlin_gssapi_library)
+  quorlin_install_target(quorlin_gssapi_library quorlin-gssapi Quorlin QuorlinGssapiTargets gssapi)
+endif()
 
 if(TARGET quorlin)
   install(TARGETS quorlin RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}" COMPONENT tools)

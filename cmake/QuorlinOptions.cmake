@@ -14,6 +14,10 @@ option(QUORLIN_RUN_PATH "Let programs and libraries find the libraries they were
 option(QUORLIN_WERROR "Treat warnings in our own code as errors" OFF)
 option(QUORLIN_LIBFUZZER "Link the fuzz targets with libFuzzer (clang only) instead of the corpus replayer" OFF)
 
+set(QUORLIN_BUILD_GSSAPI AUTO CACHE STRING
+  "Build the Kerberos component libquorlin-gssapi: ON, OFF, or AUTO for when MIT Kerberos is there")
+set_property(CACHE QUORLIN_BUILD_GSSAPI PROPERTY STRINGS AUTO ON OFF)
+
 set(QUORLIN_SANITIZE "" CACHE STRING "Sanitizers for the whole tree, for example address,undefined")
 set(QUORLIN_VENDOR_URI_BASE "http://schemas.quorlin.example" CACHE STRING
   "Scheme and host of the vendor URIs that the deployed token service uses")

@@ -47,11 +47,23 @@ quorlin_package(runtime "libquorlin${PROJECT_VERSION_MAJOR}" libs
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_GENERATE_SHLIBS ON)
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_GENERATE_SHLIBS_POLICY "=")
 
+if(TARGET quorlin_gssapi_library)
+  quorlin_package(gssapi "libquorlin-gssapi${PROJECT_VERSION_MAJOR}" libs
+    "Kerberos for the client library for WS-Trust token services"
+    "Asks WS-Trust 1.3 token services for SAML 2.0 tokens by a Kerberos ticket.\nThis is the shared library.")
+  set(CPACK_COMPONENT_GSSAPI_DEPENDS runtime)
+  set(CPACK_DEBIAN_GSSAPI_PACKAGE_GENERATE_SHLIBS ON)
+  set(CPACK_DEBIAN_GSSAPI_PACKAGE_GENERATE_SHLIBS_POLICY "=")
+endif()
+
 quorlin_package(development "libquorlin-dev" libdevel
   "Client library for WS-Trust token services (development files)"
   "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens strictly.\nThese are the headers and what CMake and pkg-config need.")
 set(CPACK_COMPONENT_DEVELOPMENT_DEPENDS runtime)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "libboost-dev")
+if(TARGET quorlin_gssapi_library)
+  list(APPEND CPACK_COMPONENT_DEVELOPMENT_DEPENDS gssapi)
+endif()
 
 if(TARGET quorlin)
   quorlin_package(tools "quorlin-tools" utils

@@ -125,7 +125,8 @@ std::vector<Command> AddAcquireCommands(CLI::App& app) {
   CLI::App* const acquire = app.add_subcommand("acquire", "Get a token from a token service");
   acquire->require_subcommand(1);
   acquire->footer("quorlin acquire COMMAND --help tells more about each way.");
-  return {AddPasswordCommand(*acquire), AddCertificateCommand(*acquire), AddTokenCommand(*acquire)};
+  return {AddPasswordCommand(*acquire), AddCertificateCommand(*acquire), AddTokenCommand(*acquire),
+          AddAcquireGssCommand(*acquire)};
 }
 
 }  // namespace Cli

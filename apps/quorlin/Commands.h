@@ -21,8 +21,10 @@ struct Command {
   std::function<int()> run;
 };
 
-/// acquire password, acquire certificate, acquire token
+/// acquire password, acquire certificate, acquire token, acquire gss
 std::vector<Command> AddAcquireCommands(CLI::App& app);
+/// acquire gss alone, a command of `acquire`
+Command AddAcquireGssCommand(CLI::App& acquire);
 /// renew
 Command AddRenewCommand(CLI::App& app);
 /// validate

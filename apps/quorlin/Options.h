@@ -74,6 +74,8 @@ Quorlin::TokenSpec MakeTokenSpec(const TokenOptions& options);
 struct OutputOptions {
   std::string file;
   bool json = false;
+  /// What a person is told whose credentials are refused; empty: the usual.
+  std::string credentialsAdvice;
 };
 
 void AddOutputOptions(CLI::App& command, OutputOptions& options);

@@ -14,6 +14,15 @@ namespace Cli {
 
 namespace {
 
+int ShowFailure(const Failure& failure, bool json) {
+  if (json) {
+    std::cout << ToText(DescribeFailure(failure)) << std::endl;
+  } else {
+    PrintFailure(failure);
+  }
+  return failure.exitCode;
+}
+
 void ShowOrThrow(const OutputOptions& options, const std::string& heading, const TokenSource& source) {
   std::optional<OutputFile> file;
   if (!options.file.empty()) {
@@ -52,18 +61,16 @@ int ShowToken(const OutputOptions& options, const std::string& heading, ExitCode
     ShowOrThrow(options, heading, source);
     return EXIT_DONE;
   } catch (...) {
-    return ShowFailure(options.json, otherwise);
+    Failure failure = DescribeCurrentException(otherwise);
+    if (failure.type == "InvalidCredentialsException" && !options.credentialsAdvice.empty()) {
+      failure.advice = options.credentialsAdvice;
+    }
+    return ShowFailure(failure, options.json);
   }
 }
 
 int ShowFailure(bool json, ExitCode otherwise) {
-  const Failure failure = DescribeCurrentException(otherwise);
-  if (json) {
-    std::cout << ToText(DescribeFailure(failure)) << std::endl;
-  } else {
-    PrintFailure(failure);
-  }
-  return failure.exitCode;
+  return ShowFailure(DescribeCurrentException(otherwise), json);
 }
 
 int RunReporting(const std::function<void()>& command) {

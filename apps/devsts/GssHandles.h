@@ -1,0 +1,67 @@
+// SPDX-License-Identifier: Apache-2.0
+// Copyright the Quorlin authors
+
+// Owners of the GSS-API objects used here.
+
+#ifndef QUORLIN_DEVSTS_GSSHANDLES_H
+#define QUORLIN_DEVSTS_GSSHANDLES_H
+
+#include <gssapi/gssapi.h>
+
+#include <string>
+
+namespace DevSts {
+
+/// Owns what GSS-API calls fill in: a name, a credential or a context.
+template <typename Handle, OM_uint32 (*Release)(OM_uint32*, Handle*)>
+class GssHandle final {
+ public:
+  GssHandle() = default;
+  GssHandle(const GssHandle&) = delete;
+  GssHandle& operator=(const GssHandle&) = delete;
+  ~GssHandle() {
+    if (_handle != nullptr) {
+      OM_uint32 ignored = 0;
+      Release(&ignored, &_handle);
+    }
+  }
+
+  Handle Get() const { return _handle; }
+  Handle* Place() { return &_handle; }
+
+ private:
+  Handle _handle = nullptr;
+};
+
+inline OM_uint32 DeleteGssContext(OM_uint32* minor, gss_ctx_id_t* context) {
+  return gss_delete_sec_context(minor, context, GSS_C_NO_BUFFER);
+}
+
+using GssName = GssHandle<gss_name_t, gss_release_name>;
+using GssCredential = GssHandle<gss_cred_id_t, gss_release_cred>;
+using GssContext = GssHandle<gss_ctx_id_t, DeleteGssContext>;
+
+/// Owns the bytes that a GSS-API call gives back.
+class GssBuffer final {
+ public:
+  GssBuffer() = default;
+  GssBuffer(const GssBuffer&) = delete;
+  GssBuffer& operator=(const GssBuffer&) = delete;
+  ~GssBuffer() {
+    OM_uint32 ignored = 0;
+    gss_release_buffer(&ignored, &_buffer);
+  }
+
+  gss_buffer_t Place() { return &_buffer; }
+  std::string ToString() const {
+    return _buffer.length == 0 ? std::string()
+                               : std::string(static_cast<const char*>(_buffer.value), _buffer.length);
+  }
+
+ private:
+  gss_buffer_desc _buffer = GSS_C_EMPTY_BUFFER;
+};
+
+}  // namespace DevSts
+
+#endif  // QUORLIN_DEVSTS_GSSHANDLES_H
