@@ -7,8 +7,10 @@
 #include "quorlin/Files.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
+#include "quorlin/explain/ElementTrail.h"
+#include "quorlin/explain/Explanation.h"
+#include "quorlin/xmlReading.h"
 
-#include <pelmar/Reader.h>
 #include <pelmar/xml/Parser.h>
 #include <quorlin/SamlToken.h>
 
@@ -18,8 +20,6 @@ namespace Cli {
 
 namespace {
 
-constexpr const char* kSamlNs = "urn:oasis:names:tc:SAML:2.0:assertion";
-
 /// More than anybody's clocks differ by, and far from the end of 64 bits of microseconds.
 constexpr long long kMaxClockToleranceSec = 100LL * 365 * 24 * 60 * 60;
 
@@ -28,42 +28,19 @@ struct VerifyArguments {
   std::vector<std::string> trustFiles;
   long long clockToleranceSec = 0;
   bool embedded = false;
+  bool explain = false;
   OutputOptions output;
 };
 
-using Trust = std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>;
-
-Pelmar::Ref<Pelmar::Xml::Document> Parse(const std::string& xml) {
-  Pelmar::Ref<Pelmar::Object> result;
-  Pelmar::Xml::CreateXMLParser(Pelmar::Xml::CreateXMLDocumentHandler())
-      ->Parse(Pelmar::CreateStringReader(xml).Get(), result);
-  return Pelmar::Xml::ViewAsDocument(result);
-}
-
-bool IsAssertion(const Pelmar::Xml::ElementNode& element) {
-  const std::string* const uri = element.FindNamespaceUri(element.GetPrefix());
-  return element.GetLocalName() == "Assertion" && uri != nullptr && *uri == kSamlNs;
-}
-
-/// The first assertion in document order; null when there is none. The parser bounds how deep this can go.
-Pelmar::Xml::ElementNode* FindAssertion(Pelmar::Xml::ElementNode* element) {
-  if (IsAssertion(*element)) {
-    return element;
-  }
-  for (Pelmar::Xml::Node* child = element->GetFirstChildNode(); child != nullptr;
-       child = child->GetNextSibling()) {
-    Pelmar::Xml::ElementNode* const childElement = Pelmar::Xml::AsElement(child);
-    Pelmar::Xml::ElementNode* const found = childElement == nullptr ? nullptr : FindAssertion(childElement);
-    if (found != nullptr) {
-      return found;
-    }
-  }
-  return nullptr;
+std::string ReadDocument(const VerifyArguments& arguments) {
+  // One byte more than the parser takes, so that a larger file is its error and still never read whole.
+  return ReadFileUpTo(arguments.file, Pelmar::Xml::kMaxDocumentBytes + 1);
 }
 
 boost::shared_ptr<const Quorlin::SamlToken> VerifyEmbedded(const std::string& xml, const Trust& trust,
                                                            long long clockToleranceSec) {
-  const Pelmar::Ref<Pelmar::Xml::Document> document = Parse(xml);
+  Pelmar::Ref<Pelmar::Xml::Document> document;
+  Quorlin::ParseXML(xml, document);
   Pelmar::Xml::ElementNode* const assertion = FindAssertion(document->GetDocumentElement());
   if (assertion == nullptr) {
     throw Quorlin::ParseException("Expected element 'Assertion' not found.");
@@ -73,10 +50,20 @@ boost::shared_ptr<const Quorlin::SamlToken> VerifyEmbedded(const std::string& xm
 
 boost::shared_ptr<const Quorlin::SamlToken> Verify(const VerifyArguments& arguments) {
   const Trust trust = ReadCertificates(arguments.trustFiles);
-  // One byte more than the parser takes, so that a larger file is its error and still never read whole.
-  const std::string xml = ReadFileUpTo(arguments.file, Pelmar::Xml::kMaxDocumentBytes + 1);
+  const std::string xml = ReadDocument(arguments);
   return arguments.embedded ? VerifyEmbedded(xml, trust, arguments.clockToleranceSec)
                             : Quorlin::CreateSamlToken(xml, trust, arguments.clockToleranceSec);
+}
+
+int ShowExplanation(const VerifyArguments& arguments) {
+  try {
+    const Explanation explanation = Explain({ReadDocument(arguments), ReadCertificates(arguments.trustFiles),
+                                             arguments.clockToleranceSec, arguments.embedded});
+    Print(arguments.output.json ? ToText(ToJson(explanation)) + "\n" : DescribeExplanation(explanation));
+    return explanation.failure ? explanation.failure->exitCode : EXIT_DONE;
+  } catch (...) {
+    return ShowFailure(arguments.output.json, EXIT_FAILED);
+  }
 }
 
 }  // namespace
@@ -99,14 +86,23 @@ Command AddVerifyCommand(CLI::App& app) {
       ->capture_default_str();
   command->add_flag("--embedded", arguments->embedded,
                     "The file is a larger document (a SOAP answer, say); take its first SAML assertion");
+  CLI::Option* const explain =
+      command->add_flag("--explain", arguments->explain,
+                        "Show every check, how it went, where in the file, and what to do about it");
   AddOutputOptions(*command, arguments->output);
+  // An explanation is for reading; whoever wants the token's XML asks for the verdict alone.
+  command->get_option("--out")->excludes(explain);
   AddLogOption(*command);
   command->footer(
       "Exit code 0: the token is good; 1: it is not; 2: a file or an argument cannot be used.\n\n"
       "Examples:\n"
       "  quorlin verify --trust sts.pem token.xml\n"
+      "  quorlin verify --trust sts.pem --explain token.xml\n"
       "  quorlin verify --trust sts.pem --embedded --json - < answer.xml");
   return {command, [arguments] {
+            if (arguments->explain) {
+              return ShowExplanation(*arguments);
+            }
             return ShowToken(arguments->output, "The token is valid", EXIT_REFUSED,
                              [&] { return Verify(*arguments); });
           }};
