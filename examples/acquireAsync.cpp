@@ -32,7 +32,6 @@ std::string ReadFile(const char* path) {
   return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
 
-// ASYNC-BEGIN
 /// Called on a platform thread. The error lives during the call only: what is kept is a copy.
 void Finish(TokenPromise& promise, const Token& token, const Pelmar::Exception* error) {
   if (error == nullptr) {
@@ -56,7 +55,6 @@ std::future<Token> Acquire(const Quorlin::SecurityTokenService& service, const s
       [promise](const Token& token, const Pelmar::Exception* error) { Finish(*promise, token, error); });
   return future;
 }
-// ASYNC-END
 
 struct Pending {
   std::string user;

@@ -18,7 +18,6 @@
 
 namespace {
 
-// SINK-BEGIN
 /// The text as a JSON string. A log line may hold whatever came from outside, so nothing gets through raw
 /// that could end the line or steer a terminal.
 std::string ToJson(const std::string& text) {
@@ -64,7 +63,6 @@ void InstallSink() {
   // Warnings and worse come anyway; the course of the operations has to be asked for.
   manager->SetEnabledLevels(Pelmar::Service::kAllLogLevels);
 }
-// SINK-END
 
 std::string ReadFile(const char* path) {
   std::ifstream file(path, std::ios::binary);

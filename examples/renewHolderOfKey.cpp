@@ -34,7 +34,6 @@ std::string ReadFile(const char* path) {
   return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
 
-// HOLD-BEGIN
 /// Hands out a token that holds for a while yet. For one thread.
 class TokenHolder {
  public:
@@ -78,19 +77,16 @@ class TokenHolder {
   long long _lifetimeSec;
   Token _token;
 };
-// HOLD-END
 
 boost::shared_ptr<Quorlin::SecurityTokenService> MakeService(char** arguments) {
   Pelmar::Ssl::SSLContextOptions tls;
   tls.caFile = arguments[2];
-  // IDENTITY-BEGIN
   Quorlin::HolderOfKeyConfig identity;
   identity.certificate = Pelmar::Crypto::CreateCertificateFromPem(ReadFile(arguments[4]));
   identity.privateKey = Pelmar::Crypto::CreatePrivateKeyFromPem(ReadFile(arguments[5]));
 
   Quorlin::SecurityTokenServiceConfig config;
   config.holderOfKeyConfig = identity;
-  // IDENTITY-END
   config.stsUrl = arguments[1];
   config.sslContext = Pelmar::Ssl::CreateSSLContext(tls);
   config.trustedStsCertificates = Pelmar::Crypto::CreateCertificatesFromPem(ReadFile(arguments[3]));

@@ -52,7 +52,6 @@ class Door {
 
 // ---- The tests ----
 
-// FIXTURE-BEGIN
 DevSts::User MakeUser(const std::string& name, const std::string& group) {
   DevSts::User user;
   user.name = name;
@@ -87,7 +86,6 @@ class DoorTest : public testing::Test {
 
   DevSts::Service service{MakeServiceConfig()};
 };
-// FIXTURE-END
 
 TEST_F(DoorTest, LetsAnAdministratorIn) {
   EXPECT_TRUE(Door(MakeClientConfig()).MayEnter("ada@example.com", "open sesame"));

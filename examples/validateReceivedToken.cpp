@@ -42,7 +42,6 @@ std::string ReadFile(const char* path) {
   return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
 
-// CHECK-BEGIN
 /// A token without audience is for everybody; one with an audience has to name us. The library leaves this to
 /// the server, which alone knows its own name.
 void RequireAudience(const Quorlin::SamlToken& token, const std::string& ownUri) {
@@ -71,7 +70,6 @@ Token Check(const std::string& xml, const std::list<Certificate>& trusted, const
   RequireHolder(*token, client);
   return token;
 }
-// CHECK-END
 
 void PrintCaller(const Quorlin::SamlToken& token) {
   std::cout << "welcome " << token.GetSubject().ToString() << "\n";
@@ -93,7 +91,6 @@ int Run(int argc, char** argv) {
       argc == 4 ? Pelmar::Crypto::CreateCertificateFromPem(ReadFile(argv[3])) : Certificate();
   const std::string xml((std::istreambuf_iterator<char>(std::cin)), std::istreambuf_iterator<char>());
 
-  // CATCH-BEGIN
   try {
     PrintCaller(*Check(xml, trusted, argv[2], client));
     return 0;
@@ -110,7 +107,6 @@ int Run(int argc, char** argv) {
     const std::unique_ptr<Quorlin::ParseException> error(thrownByPointer);
     return Refuse(error->what());
   }
-  // CATCH-END
 }
 
 }  // namespace
