@@ -19,6 +19,8 @@
 #include <utility>
 #include <vector>
 
+#include <fcntl.h>
+
 namespace DevSts {
 
 namespace {
@@ -164,10 +166,18 @@ Tcp::endpoint ToEndpoint(const HttpServerOptions& options) {
   return Tcp::endpoint(address, options.port);
 }
 
+/// A program that the process starts must not hold our sockets: the port would stay open after our end, and
+/// clients would wait for answers that nobody gives.
+void KeepFromChildren(int socket) {
+  fcntl(socket, F_SETFD, FD_CLOEXEC);
+}
+
 Tcp::acceptor Listen(asio::io_context& context, const HttpServerOptions& options) {
   const Tcp::endpoint endpoint = ToEndpoint(options);
   try {
-    return Tcp::acceptor(context, endpoint, true);
+    Tcp::acceptor acceptor(context, endpoint, true);
+    KeepFromChildren(acceptor.native_handle());
+    return acceptor;
   } catch (const boost::system::system_error& e) {
     throw std::runtime_error("cannot listen on " + options.address + " port " + std::to_string(options.port) +
                              ": " + e.code().message());
@@ -227,6 +237,7 @@ class HttpServer::Impl final {
         AcceptLater();
         return;
       }
+      KeepFromChildren(socket.native_handle());
       Serve(std::move(socket));
       Accept();
     });

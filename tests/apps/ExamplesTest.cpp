@@ -4,6 +4,7 @@
 // The example programs, run as their users would run them, and the README's code, which is cut from one of
 // them.
 
+#include "apps/ChildProcess.h"
 #include "support/Pki.h"
 #include "support/Process.h"
 #include "support/TemporaryDirectory.h"
@@ -58,6 +59,7 @@ class World final {
   std::string WriteFile(const std::string& name, const std::string& content) const {
     return _files.WriteFile(name, content);
   }
+  const std::string& GetUrl() const { return _service.GetUrl(); }
   DevSts::Service& GetService() { return _service; }
 
   /// Set up with the client's own key, if `identity` is given.
@@ -118,9 +120,15 @@ class RobotWorld final {
   }
 
   ProcessResult Renew(long long lifetimeSec, const std::string& work) const {
-    return _world.RunClient(
-        "renewHolderOfKey",
-        {_world.GetPath("cert.pem"), _world.GetPath("key.pem"), std::to_string(lifetimeSec)}, work);
+    return TestSupport::RunProcess(MakeRenew(lifetimeSec), work);
+  }
+
+  /// The command that Renew runs.
+  std::vector<std::string> MakeRenew(long long lifetimeSec) const {
+    return {GetExamplePath("renewHolderOfKey"), _world.GetUrl(),
+            _world.GetPath("ca.pem"),           _world.GetPath("sts.pem"),
+            _world.GetPath("cert.pem"),         _world.GetPath("key.pem"),
+            std::to_string(lifetimeSec)};
   }
 
   const TestSupport::Identity& GetIdentity() const { return _identity; }
@@ -208,6 +216,25 @@ TEST(Examples, RenewHolderOfKeyKeepsATokenThatHoldsLongEnough) {
             "sweep as {Name: robot; Domain:example.com}\n"
             "mow as {Name: robot; Domain:example.com}\n");
   EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, RenewHolderOfKeyWorksOnWhileTheServiceIsAway) {
+  RobotWorld robot;
+  StsTests::ChildProcess child(robot.MakeRenew(30), StsTests::ChildProcess::Terminal::OWN);
+  child.Type("sweep\n");
+  child.ReadUntil("sweep as {Name: robot; Domain:example.com}\r\n");
+  robot.GetWorld().GetService().Stop();
+  child.Type("mow\n");
+  const std::string output = child.ReadUntil("mow as {Name: robot; Domain:example.com}\r\n");
+  EXPECT_EQ(Mask(Mask(output, kUuidPattern, "ID"), "127[.]0[.]0[.]1:[0-9]+", "SERVICE"),
+            "sweep\r\n"
+            "acquired ID\r\n"
+            "sweep as {Name: robot; Domain:example.com}\r\n"
+            "mow\r\n"
+            "not renewed: Connection refused by SERVICE\r\n"
+            "mow as {Name: robot; Domain:example.com}\r\n");
+  child.Type("\x04");
+  EXPECT_EQ(child.Wait(), 0);
 }
 
 TEST(Examples, RenewHolderOfKeySaysThatTheLifetimeIsBad) {
