@@ -8,7 +8,8 @@ from collections import defaultdict
 
 from pages import Page, finish, read_root
 
-FOREIGN = {"openssl": "OpenSSL", "curl": "curl", "expat.h": "expat", "boost": "Boost", "nlohmann": "nlohmann-json", "CLI": "CLI11"}
+FOREIGN = {"openssl": "OpenSSL", "curl": "curl", "expat.h": "expat", "boost": "Boost", "nlohmann": "nlohmann-json", "CLI": "CLI11",
+           "gssapi": "GSS-API"}
 INCLUDE = re.compile(r'^#include [<"]([^>"]+)', re.MULTILINE)
 
 
@@ -19,7 +20,7 @@ def name_part(path):
     path = re.sub(r"^lib/(public/)?", "", path)
     if path.startswith("pelmar/"):
         return path.split("/")[1] if path.count("/") > 1 else "core"
-    return "quorlin-gssapi" if path.startswith(("gssapi/", "quorlin/gssapi/")) else "libquorlin"
+    return "gssapi" if path.startswith("quorlin-gssapi/") else "libquorlin"
 
 
 def name_included(root, part, included):
@@ -31,7 +32,7 @@ def name_included(root, part, included):
         return name_part("apps/" + included)
     if first == "devsts":
         return "devsts"
-    return name_part("lib/" + included) if first in ("pelmar", "quorlin", "gssapi") else ""
+    return name_part("lib/" + included) if first in ("pelmar", "quorlin", "quorlin-gssapi") else ""
 
 
 def read_uses(root):

@@ -10,6 +10,7 @@
 #include <pelmar/service/Logger.h>
 #include <pelmar/xml/Node.h>
 #include <pelmar/xml/Parser.h>
+#include <quorlin-gssapi/GssapiNegotiation.h>
 #include <quorlin/quorlin.h>
 
 #include <boost/make_shared.hpp>
@@ -19,6 +20,7 @@
 #include <string>
 #include <vector>
 
+void PrintToken(const Quorlin::SamlToken& token);
 std::string ReadFile(const std::string& path);
 Quorlin::Leg StepOfYourMechanism(const Quorlin::Leg& serverLeg);
 Pelmar::Xml::ElementNode* FindTheAssertion(Pelmar::Xml::ElementNode* envelope);
@@ -27,6 +29,7 @@ extern Quorlin::SecurityTokenServiceConfig config;
 extern boost::shared_ptr<Quorlin::SecurityTokenService> service;
 extern boost::shared_ptr<const Quorlin::SamlToken> token;
 extern std::string password;
+extern std::string target;
 extern std::string xml;
 extern std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> trusted;
 extern std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> trustedStsCertificates;
