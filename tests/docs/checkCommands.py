@@ -14,6 +14,7 @@ import sys
 from pages import finish, read_pages, read_root
 
 SHELL = ("", "sh", "bash", "shell", "console")
+PLACEHOLDER = "COMMAND"
 INLINE = re.compile(r"`((?:quorlin|\./dev) [^`]*)`")
 
 
@@ -46,6 +47,8 @@ def check_quorlin(tool, words):
     words = words[1:]
     while words and words[0] in tool.read_subcommands(command):
         command.append(words.pop(0))
+    if words and words[0] == PLACEHOLDER:
+        return ""
     if words and tool.read_subcommands(command) and not words[0].startswith("-"):
         return f"there is no command '{' '.join(command + words[:1])}'"
     flags = tool.read_flags(command)
@@ -57,7 +60,7 @@ def check_quorlin(tool, words):
 
 def check_dev(usage, words):
     names = re.findall(r"^  ([a-z]+)", usage, re.MULTILINE)
-    if len(words) > 1 and words[1] not in names and words[1] != "COMMAND":
+    if len(words) > 1 and words[1] not in names and words[1] != PLACEHOLDER:
         return f"./dev has no command '{words[1]}'"
     return ""
 

@@ -2,7 +2,7 @@
 # Copyright the Quorlin authors
 
 """The JSON in docs/command-line.md is what the tool prints, but for dates, identifiers and digests; its tables name every command
-and every exit code.
+and every exit code, and docs/dev-sts.md every switch of the service.
 
 usage: checkTool.py QUORLIN
 """
@@ -51,6 +51,14 @@ def read_commands(program, command=()):
     return [found for name in names for found in read_commands(program, (*command, name))]
 
 
+def find_untold_switches(program, root):
+    """The switches of "quorlin sts" that no row of its page begins with."""
+    text = subprocess.run([program, "sts", "--help"], capture_output=True, text=True, check=True).stdout
+    rows = [line for line in Page(root, root / "docs" / "dev-sts.md").lines if line.startswith("| `--")]
+    told = re.findall(r"`(--[\w-]+)", "\n".join(row.split("|")[1] for row in rows))
+    return sorted(set(re.findall(r"^  (--[\w-]+)", text, re.MULTILINE)) - set(told))
+
+
 def main():
     root = read_root()
     page = Page(root, root / "docs" / "command-line.md")
@@ -68,6 +76,7 @@ def main():
     for code in re.findall(r"EXIT_\w+ = (\d+)", codes):
         if f"\n| {code} | " not in table:
             faults.append(f"{page.name}: does not tell exit code {code}")
+    faults += [f"docs/dev-sts.md: does not tell {switch}" for switch in find_untold_switches(sys.argv[1], root)]
     finish(faults, f"{len(outputs)} outputs and {len(commands)} commands")
 
 
