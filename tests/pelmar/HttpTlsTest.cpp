@@ -456,6 +456,16 @@ TEST(HttpTlsPins, RefuseAnotherKey) {
   EXPECT_EQ("HttpException: Public key of sts.test matches none of the pins", CallPinned(MakePin(GetCa())));
 }
 
+TEST(HttpTlsPins, HoldForResumedSessionsToo) {
+  LoopbackServer server(TlsServerSettings(GetServerIdentity()), {AnswerAndClose});
+  const Ref<ConnectionSpec> spec =
+      MakeSpec(server, MakeContext(GetCa()), "sts.test", MakePin(GetServerIdentity()));
+  for (std::size_t i = 0; i < 2; ++i) {
+    EXPECT_EQ("200 OK|hello", Call(*MakeAgent(spec), MakePost("/", "x")));
+    EXPECT_EQ(i > 0, server.GetRecord(i).wasResumed) << i;
+  }
+}
+
 TEST(HttpTlsPins, DoNotReplaceTrust) {
   const Identity stranger = MakeCa("Strange CA", 2);
   EXPECT_EQ("HttpException: Certificate of sts.test is not trusted: issuer CN=Test CA",
