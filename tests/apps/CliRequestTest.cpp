@@ -9,6 +9,7 @@
 #include "support/Pki.h"
 
 #include "devsts/Service.h"
+#include "devsts/ToyNegotiation.h"
 
 #include <pelmar/StringUtil.h>
 #include <pelmar/http/Url.h>
@@ -21,6 +22,7 @@
 #include <sys/stat.h>
 
 #include <cstddef>
+#include <memory>
 #include <string>
 #include <utility>
 #include <vector>
@@ -106,6 +108,8 @@ class Desk final {
     DevSts::ServiceConfig config;
     config.tls = false;
     config.directory = DevSts::Directory({robot});
+    config.handler.negotiation = std::make_shared<DevSts::ToyMechanism>(
+        DevSts::ToyOptions(), config.directory, DevSts::MakeSystemClock(0));
     return config;
   }
 
@@ -307,20 +311,23 @@ TEST(CliRequest, RefusesAPasswordThatXmlCannotCarryAlsoWhenItIsNotShown) {
 
 // --- What others make of it ---
 
-/// Posts to the service, and gives the status and the name of what the SOAP body holds.
-std::string Post(const ProcessResult& shown) {
+/// Posts what is shown to the service; the answer as "200 OK|body".
+std::string PostAsIs(const ProcessResult& shown) {
   EXPECT_EQ(shown.exitCode, 0) << shown.standardError;
   const Json json = Json::parse(shown.standardOutput);
   const Pelmar::Http::HttpURL url = Pelmar::Http::ParseHttpURL(Desk::Get().GetService().GetUrl());
   const auto request = MakePost(url.path, json.at("envelope").get<std::string>());
   request->SetHeader("Content-Type", "text/xml; charset=utf-8");
   request->SetHeader("SOAPAction", "\"" + json.at("soapAction").get<std::string>() + "\"");
-  const auto agent = MakeAgent(url.port);
-  const std::string answer = Call(*agent, request);
-  const std::string status = answer.substr(0, answer.find('|'));
+  return Call(*MakeAgent(url.port), request);
+}
+
+/// The same, but of the body only what it holds.
+std::string Post(const ProcessResult& shown) {
+  const std::string answer = PostAsIs(shown);
   for (const char* const word : {"RequestedSecurityToken", "/status/valid", "faultcode"}) {
     if (answer.find(word) != std::string::npos) {
-      return status + ": " + word;
+      return answer.substr(0, answer.find('|')) + ": " + word;
     }
   }
   return answer;
@@ -336,6 +343,25 @@ TEST(CliRequest, IsTakenByAService) {
   EXPECT_EQ(Post(desk.RunWithKey(Join(kExchange, {"--json"}))), "200 OK: RequestedSecurityToken");
   EXPECT_EQ(Post(desk.RunWithKey(Join(kRenew, {"--json"}))), "200 OK: RequestedSecurityToken");
   EXPECT_EQ(Post(desk.Run(Join(kValidate, {"--json"}))), "200 OK: /status/valid");
+}
+
+TEST(CliRequest, CarriesANegotiation) {
+  const Desk& desk = Desk::Get();
+  DevSts::ToyClient client(DevSts::ToyOptions(), "robot@example.com", "correct horse",
+                           DevSts::MakeSystemClock(0));
+  const auto writeLeg = [&](const DevSts::NegotiationLeg& serverLeg) {
+    const DevSts::NegotiationLeg leg = client.Answer(serverLeg);
+    desk.WriteFile("toy.bin", std::string(leg.begin(), leg.end()));
+  };
+  writeLeg({});
+  const std::string answer = PostAsIs(desk.Run({"spnego", "--leg", "{toy.bin}", "--json"}));
+  const std::string exchange = CutBetween(answer, "BinaryExchange", "</");
+  const std::vector<unsigned char> serverLeg =
+      Pelmar::StringUtil::Base64Decode(exchange.substr(exchange.find('>') + 1));
+  writeLeg(DevSts::NegotiationLeg(serverLeg.begin(), serverLeg.end()));
+  EXPECT_EQ(Post(desk.Run({"spnego", "--leg", "{toy.bin}", "--context",
+                           CutBetween(answer, "Context=\"", "\""), "--json"})),
+            "200 OK: RequestedSecurityToken");
 }
 
 TEST(CliRequest, WithTheMaskIsNoMoreThanAWrongPassword) {
