@@ -1,7 +1,8 @@
 # SPDX-License-Identifier: Apache-2.0
 # Copyright the Quorlin authors
 
-"""Every link of a page that stays inside the project leads to a file that is there, and to a heading that it has."""
+"""Every link of a page that stays inside the project leads to a file that is there, and to a heading that it has; the indexes lead to every page and
+every example."""
 
 import re
 from urllib.parse import unquote
@@ -71,6 +72,10 @@ def main():
     for page in pages:
         if page.path.parent == root / "docs" and page.path.name != "README.md" and f"({page.path.name})" not in index:
             faults.append(f"docs/README.md: does not lead to {page.path.name}")
+    listed = (root / "examples" / "README.md").read_text(encoding="utf-8")
+    for example in sorted((root / "examples").glob("*.cpp")):
+        if f"({example.name})" not in listed:
+            faults.append(f"examples/README.md: does not lead to {example.name}")
     finish(faults, f"{count} links")
 
 

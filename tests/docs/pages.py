@@ -61,7 +61,7 @@ class Page:
 
 def read_pages(root):
     """All pages that people are sent to, in a fixed order."""
-    paths = sorted(root.glob("*.md")) + sorted((root / "docs").rglob("*.md"))
+    paths = sorted(root.glob("*.md")) + sorted((root / "docs").rglob("*.md")) + sorted((root / "examples").glob("*.md"))
     return [Page(root, path) for path in paths]
 
 
