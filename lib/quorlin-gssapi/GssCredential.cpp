@@ -71,11 +71,15 @@ GssCredential AcquireSpnegoCredential(const std::string& principal, const std::s
   return credential;
 }
 
-bool HasExpired(const GssCredential& credential) {
+bool IsFaultOf(const GssCredential& credential, OM_uint32 major) {
+  if (GSS_ROUTINE_ERROR(major) == GSS_S_NO_CRED) {
+    return true;
+  }
+  // That a ticket has expired is reported as a failure of no particular kind.
   OM_uint32 minor = 0;
   OM_uint32 lifetime = GSS_C_INDEFINITE;
-  const OM_uint32 major = gss_inquire_cred(&minor, credential.Get(), nullptr, &lifetime, nullptr, nullptr);
-  return GSS_ROUTINE_ERROR(major) == GSS_S_CREDENTIALS_EXPIRED || (!GSS_ERROR(major) && lifetime == 0);
+  const OM_uint32 inquiry = gss_inquire_cred(&minor, credential.Get(), nullptr, &lifetime, nullptr, nullptr);
+  return GSS_ROUTINE_ERROR(inquiry) == GSS_S_CREDENTIALS_EXPIRED || (!GSS_ERROR(inquiry) && lifetime == 0);
 }
 
 }  // namespace InternalApi

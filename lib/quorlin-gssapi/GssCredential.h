@@ -20,8 +20,9 @@ gss_OID GetSpnegoMechanism();
 /// text leaves the choice to Kerberos. Throws InvalidCredentialsException.
 GssCredential AcquireSpnegoCredential(const std::string& principal, const std::string& credentialCache);
 
-/// Whether the credential's ticket is there but has expired.
-bool HasExpired(const GssCredential& credential);
+/// Whether a call that came to `major` failed because of the credential that it was given: because it holds
+/// no ticket, or one that has expired.
+bool IsFaultOf(const GssCredential& credential, OM_uint32 major);
 
 }  // namespace InternalApi
 }  // namespace Quorlin

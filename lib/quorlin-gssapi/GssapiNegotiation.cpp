@@ -26,7 +26,7 @@ using InternalApi::GssContext;
 using InternalApi::GssCredential;
 using InternalApi::GssName;
 using InternalApi::GssStatus;
-using InternalApi::HasExpired;
+using InternalApi::IsFaultOf;
 
 // SPNEGO protects its choice of mechanism by an integrity code (RFC 4178, section 5).
 constexpr OM_uint32 kFlags = GSS_C_MUTUAL_FLAG | GSS_C_INTEG_FLAG;
@@ -137,8 +137,7 @@ boost::shared_ptr<Leg> GssapiNegotiationHandlerImpl::Step(const Leg& serverLeg) 
 void GssapiNegotiationHandlerImpl::ThrowFailure(const GssStatus& status) const {
   // First of all: the text of a minor code is only there until the next call.
   const std::string message = DescribeTarget() + " failed: " + DescribeStatus(status);
-  // An expired ticket is reported as a failure of no particular kind.
-  if (HasExpired(_credential)) {
+  if (IsFaultOf(_credential, status.major)) {
     throw InvalidCredentialsException(message);
   }
   throw SsoException(message);

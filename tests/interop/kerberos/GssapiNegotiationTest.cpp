@@ -101,6 +101,17 @@ TEST(GssapiNegotiation, SaysThatThereIsNoTicket) {
             std::string(kUnusable) + kNoCredentials + "No credentials cache found");
 }
 
+TEST(GssapiNegotiation, SaysThatTheCacheHoldsNoTicket) {
+  GssapiOptions options = MakeOptions();
+  const std::string cache = Realm().MakeEmptyCache("empty");
+  const std::string problem = std::string(kNoCredentials) + "Credential cache is empty";
+  const EnvironmentVariable defaultCache("KRB5CCNAME", cache);
+  EXPECT_EQ(OutcomeOfFirstLeg(options), std::string("InvalidCredentialsException: ") + kFailed + problem)
+      << "the default cache, which is only opened when the target is known";
+  options.credentialCache = cache;
+  EXPECT_EQ(OutcomeOfFirstLeg(options), kUnusable + problem);
+}
+
 TEST(GssapiNegotiation, SaysThatTheTicketHasExpired) {
   GssapiOptions options = MakeOptions();
   options.credentialCache = Realm().MakeExpiredCache("expired");

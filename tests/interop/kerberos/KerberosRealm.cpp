@@ -3,7 +3,7 @@
 
 #include "interop/kerberos/KerberosRealm.h"
 
-#include "interop/kerberos/ExpiredCache.h"
+#include "interop/kerberos/CacheCopies.h"
 #include "support/LoopbackServer.h"
 #include "support/Process.h"
 
@@ -176,6 +176,12 @@ std::string KerberosRealm::LogIn(const std::string& user, const std::string& pas
                                  const std::string& cacheName) const {
   const std::string cache = MakeCacheName(cacheName);
   Run("krb5-user", {"kinit", "-c", cache, user}, password + "\n");
+  return cache;
+}
+
+std::string KerberosRealm::MakeEmptyCache(const std::string& cacheName) const {
+  const std::string cache = MakeCacheName(cacheName);
+  CopyOwner(GetCache(), cache);
   return cache;
 }
 

@@ -58,6 +58,8 @@ class KerberosRealm final {
   std::string LogIn(const std::string& user, const std::string& password, const std::string& cacheName) const;
   /// From now on nobody answers for the realm.
   void StopKdc();
+  /// A new cache of alice's without a ticket.
+  std::string MakeEmptyCache(const std::string& cacheName) const;
   /// A new cache with alice's ticket as it looks when it has expired an hour ago.
   std::string MakeExpiredCache(const std::string& cacheName) const;
 

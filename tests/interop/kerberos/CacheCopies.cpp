@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-#include "interop/kerberos/ExpiredCache.h"
+#include "interop/kerberos/CacheCopies.h"
 
 #include <krb5.h>
 
@@ -60,14 +60,24 @@ void StoreExpired(krb5_context context, krb5_ccache cache, krb5_creds& ticket) {
   Require(krb5_cc_store_cred(context, cache, &ticket), "krb5_cc_store_cred");
 }
 
+Cache MakeCacheOfSameOwner(krb5_context context, krb5_ccache source, const std::string& name) {
+  Cache target = Resolve(context, name);
+  const Principal owner = GetOwner(context, source);
+  Require(krb5_cc_initialize(context, target.get(), owner.get()), "krb5_cc_initialize");
+  return target;
+}
+
 }  // namespace
+
+void CopyOwner(const std::string& from, const std::string& to) {
+  const Context context = MakeContext();
+  MakeCacheOfSameOwner(context.get(), Resolve(context.get(), from).get(), to);
+}
 
 void CopyExpired(const std::string& from, const std::string& to) {
   const Context context = MakeContext();
   const Cache source = Resolve(context.get(), from);
-  const Cache target = Resolve(context.get(), to);
-  const Principal owner = GetOwner(context.get(), source.get());
-  Require(krb5_cc_initialize(context.get(), target.get(), owner.get()), "krb5_cc_initialize");
+  const Cache target = MakeCacheOfSameOwner(context.get(), source.get(), to);
   krb5_cc_cursor cursor;
   Require(krb5_cc_start_seq_get(context.get(), source.get(), &cursor), "krb5_cc_start_seq_get");
   krb5_creds ticket;
