@@ -5,6 +5,7 @@
 
 #include "quorlin/Commands.h"
 #include "quorlin/Files.h"
+#include "quorlin/Kerberos.h"
 #include "quorlin/Outcome.h"
 #include "quorlin/Signals.h"
 #include "quorlin/StsFiles.h"
@@ -34,7 +35,24 @@ struct StsArguments {
   std::string signingKeyFile;
   std::string signingCertificateFile;
   unsigned toyLegs = 0;
+  std::string keytabFile;
+  std::string kerberosService;
 };
+
+void AddKerberosOptions(CLI::App& command, StsArguments& arguments) {
+  CLI::Option* const keytab =
+      command
+          .add_option(
+              "--keytab", arguments.keytabFile,
+              "Let clients negotiate (SPNEGO) by Kerberos tickets for the services whose keys are in here")
+          ->type_name("FILE")
+          ->excludes("--toy-negotiation");
+  command
+      .add_option("--gss-service", arguments.kerberosService,
+                  "Take tickets for this service of --keytab alone")
+      ->type_name("SERVICE@HOST")
+      ->needs(keytab);
+}
 
 /// One write per line, so that lines of several requests do not mix.
 DevSts::LogSink MakeStandardErrorLog() {
@@ -79,6 +97,9 @@ DevSts::ServiceConfig MakeConfig(const StsArguments& arguments) {
     options.legs = arguments.toyLegs;
     config.handler.negotiation = std::make_shared<DevSts::ToyMechanism>(
         options, config.directory, DevSts::MakeSystemClock(config.clockOffsetSec));
+  }
+  if (!arguments.keytabFile.empty()) {
+    config.handler.negotiation = MakeKerberosMechanism(arguments.keytabFile, arguments.kerberosService);
   }
   return config;
 }
@@ -172,6 +193,7 @@ Command AddStsCommand(CLI::App& app) {
           "Let clients negotiate (SPNEGO) by a toy mechanism of so many legs; safe for nothing but tests")
       ->type_name("LEGS")
       ->check(CLI::Range(1U, DevSts::kMaxToyLegs));
+  AddKerberosOptions(*command, *arguments);
   command->footer(
       "Prints one JSON line when it is ready: {\"url\":...,\"ca\":...,\"stsCert\":...}. Writes one JSON line for each\n"
       "request to standard error. Ends on Ctrl-C.\n\n"
