@@ -158,7 +158,7 @@ TEST(CliAcquireGss, RefusesATargetWithoutAHost) {
             "(InvalidArgumentException)\n");
 }
 
-TEST(CliSts, ReportsAKeytabThatCannotBeUsed) {
+TEST(CliStsWithKeytab, ReportsAKeytabThatCannotBeUsed) {
   const std::string path = Realm().GetFiles().GetPath("nothing");
   const ProcessResult result = StsTests::RunCli({"sts", "--keytab", path});
   EXPECT_EQ(result.exitCode, 2);
@@ -167,7 +167,7 @@ TEST(CliSts, ReportsAKeytabThatCannotBeUsed) {
                                       "Keytab FILE:" + path + " is nonexistent or empty (UsageException)\n");
 }
 
-TEST(CliSts, NegotiatesInOneWayOnly) {
+TEST(CliStsWithKeytab, NegotiatesInOneWayOnly) {
   const ProcessResult result =
       StsTests::RunCli({"sts", "--keytab", Realm().GetKeytab(), "--toy-negotiation", "2"});
   EXPECT_EQ(result.exitCode, 2);
