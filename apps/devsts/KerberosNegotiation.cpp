@@ -40,8 +40,10 @@ std::string DescribeCode(OM_uint32 code, int codeType, gss_OID mechanism) {
 
 std::string DescribeStatus(OM_uint32 major, OM_uint32 minor, gss_OID mechanism) {
   const std::string text = DescribeCode(major, GSS_C_GSS_CODE, GSS_C_NO_OID);
-  // A minor code of 0 would be called an "Unknown error".
-  return minor == 0 ? text : text + ": " + DescribeCode(minor, GSS_C_MECH_CODE, mechanism);
+  const std::string detail = DescribeCode(minor, GSS_C_MECH_CODE, mechanism);
+  // A mechanism with nothing to add leaves the code at 0, which GSS-API may give another number but calls by
+  // the same text: an "Unknown error".
+  return detail == DescribeCode(0, GSS_C_MECH_CODE, mechanism) ? text : text + ": " + detail;
 }
 
 void RequireUsable(OM_uint32 major, OM_uint32 minor, gss_OID mechanism, const KerberosOptions& options) {

@@ -29,9 +29,10 @@ std::string DescribeCode(OM_uint32 code, int codeType, gss_OID mechanism) {
 
 std::string DescribeStatus(const GssStatus& status) {
   const std::string major = DescribeCode(status.major, GSS_C_GSS_CODE, GSS_C_NO_OID);
-  // A minor code of 0 would be called an "Unknown error".
-  return status.minor == 0 ? major
-                           : major + ": " + DescribeCode(status.minor, GSS_C_MECH_CODE, status.mechanism);
+  const std::string minor = DescribeCode(status.minor, GSS_C_MECH_CODE, status.mechanism);
+  // A mechanism with nothing to add leaves the code at 0, which GSS-API may give another number but calls by
+  // the same text: an "Unknown error".
+  return minor == DescribeCode(0, GSS_C_MECH_CODE, status.mechanism) ? major : major + ": " + minor;
 }
 
 }  // namespace InternalApi

@@ -203,14 +203,17 @@ std::size_t FindProof(const Leg& leg) {
 }
 
 TEST(GssapiNegotiation, RefusesAChangeOfAnyByteOfTheProof) {
-  const Leg whole = Accept(MakeFirstLeg(MakeHandler())).leg;
-  const std::size_t begin = FindProof(whole);
-  ASSERT_LT(begin + 50, whole.size());
-  for (std::size_t i = begin; i < whole.size(); ++i) {
+  // Two proofs may differ in length by a few bytes: they hold a random number in as few bytes as it needs.
+  constexpr std::size_t kMinProofBytes = 60;
+  for (std::size_t i = 0;; ++i) {
     const Handler handler = MakeHandler();
     Leg leg = Accept(MakeFirstLeg(handler)).leg;
-    ASSERT_EQ(FindProof(leg), begin);
-    leg[i] ^= 0x01;
+    const std::size_t changed = FindProof(leg) + i;
+    if (changed >= leg.size()) {
+      EXPECT_GT(i, kMinProofBytes);
+      break;
+    }
+    leg[changed] ^= 0x01;
     EXPECT_EQ(OutcomeOf([&] { handler->Negotiate(leg); }),
               std::string("SsoException: ") + kFailed + kUnspecified + "Decrypt integrity check failed")
         << "byte " << i;
