@@ -4,6 +4,7 @@
 // quorlin_bench [--check] [--rounds N]: measures, and prints a table. With --check it exits with 1 when a
 // ratio is beyond its limit.
 
+#include "bench/LoadRows.h"
 #include "bench/Rows.h"
 
 #include <cstdio>
@@ -125,6 +126,8 @@ std::vector<std::vector<Result>> MeasureAll(const std::vector<Section>& sections
 }
 
 int Run(const Options& options) {
+  // First, because it must be made before there are threads.
+  ServiceProcess service;
   const std::vector<Section> sections = {MakeValidationSection(), MakeStepsSection(),
                                          MakeSignedRequestsSection(), MakeUnsignedRequestsSection(),
                                          MakeHttpsSection()};
@@ -135,6 +138,7 @@ int Run(const Options& options) {
   }
   std::printf("\n(*) The floor has one more step: OpenSSL decodes the holder's certificate.\n");
   bool within = PrintGrowth(sections.front(), results.front());
+  PrintLoad(service);
   if (!options.check) {
     return EXIT_SUCCESS;
   }

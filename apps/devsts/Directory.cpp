@@ -105,6 +105,10 @@ const User* Directory::Authenticate(const std::string& name, const std::string& 
 }
 
 Directory Directory::MakeSample() {
+  return Directory(MakeSampleUsers());
+}
+
+std::vector<User> Directory::MakeSampleUsers() {
   User alice;
   alice.name = "alice";
   alice.domain = "example.com";
@@ -128,7 +132,7 @@ Directory Directory::MakeSample() {
   backup.password = "tape";
   backup.solution = true;
 
-  return Directory({alice, bob, backup});
+  return {alice, bob, backup};
 }
 
 }  // namespace DevSts

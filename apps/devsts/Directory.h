@@ -61,6 +61,8 @@ class Directory final {
   /// Alice (alice@example.com, password "secret"), Bob and a service account, for a service started without a
   /// file.
   static Directory MakeSample();
+  /// The same, to be changed.
+  static std::vector<User> MakeSampleUsers();
 
   /// Throws DirectoryException for two users of one name, and for names that cannot stand in a token.
   explicit Directory(std::vector<User> users);

@@ -8,6 +8,7 @@
 
 #include "devsts/Identity.h"
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
@@ -22,6 +23,7 @@ struct HttpRequest {
   std::string target;
   std::string contentType;  ///< Empty: no such header.
   std::string soapAction;   ///< Empty: no such header.
+  std::string cookie;       ///< Empty: no such header.
   std::string body;
 };
 
@@ -29,7 +31,10 @@ struct HttpResponse {
   int status = 200;
   std::string contentType;
   std::string body;
-  std::string allow;  ///< For the Allow header; empty: none.
+  std::string allow;                   ///< For the Allow header; empty: none.
+  std::string setCookie;               ///< For the Set-Cookie header; empty: none.
+  std::chrono::milliseconds delay{0};  ///< How long to hold the answer back. Keeps no thread busy.
+  bool isDropped = false;              ///< Instead of an answer the connection is closed.
 };
 
 struct HttpServerOptions {

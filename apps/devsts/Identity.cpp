@@ -201,8 +201,11 @@ Identity CertificateAuthority::IssueServer(const std::vector<std::string>& names
 }
 
 Identity CertificateAuthority::IssueSigner() const {
-  return Issue(Own(EVP_RSA_gen(kSignerKeyBits)), "Quorlin development token service",
-               "critical,digitalSignature", "", "");
+  return IssueClient("Quorlin development token service");
+}
+
+Identity CertificateAuthority::IssueClient(const std::string& commonName) const {
+  return Issue(Own(EVP_RSA_gen(kSignerKeyBits)), commonName, "critical,digitalSignature", "", "");
 }
 
 }  // namespace DevSts

@@ -47,6 +47,8 @@ class CertificateAuthority final {
 
   /// An RSA 2048 key and a certificate to sign tokens with.
   Identity IssueSigner() const;
+  /// An RSA 2048 key and a certificate for a client that signs its requests.
+  Identity IssueClient(const std::string& commonName) const;
 
  private:
   Identity Issue(const KeyHandle& key, const std::string& commonName, const std::string& keyUsage,

@@ -34,6 +34,7 @@ struct RunningNegotiation {
   /// signed.
   Pelmar::Ref<const Pelmar::Crypto::Certificate> proofCertificate;
   std::string proofSignatureId;
+  std::string cookie;     ///< "name=value" that every further leg has to bring; empty: none.
   long long started = 0;  ///< Microseconds since the epoch.
 };
 

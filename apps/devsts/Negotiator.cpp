@@ -52,6 +52,23 @@ void RequireSupport(const std::shared_ptr<const NegotiationMechanism>& mechanism
   }
 }
 
+/// Whether `cookie` is one of those in a Cookie header: pairs with "; " between them (RFC 6265,
+/// section 4.2.1).
+bool Holds(const std::string& cookies, const std::string& cookie) {
+  return ("; " + cookies + ";").find("; " + cookie + ";") != std::string::npos;
+}
+
+void RequireCookie(const RunningNegotiation& running, const std::string& cookies,
+                   const AuthenticationContext& context) {
+  if (running.cookie.empty()) {
+    return;
+  }
+  if (!Holds(cookies, running.cookie)) {
+    throw Fault(FaultCode::REQUEST_FAILED, "The negotiation's cookie did not come back");
+  }
+  context.record.AddPassed("cookie");
+}
+
 Caller MakeNegotiatedCaller(const std::string& principal, const std::string& authnContext,
                             const RunningNegotiation& running, const AuthenticationContext& context) {
   const User* const user = context.directory.FindByName(principal);
@@ -80,15 +97,22 @@ NegotiationRound Negotiator::Start(const SoapMessage& message, const SecurityHea
   running.wishes = request;
   running.started = context.now;
   running.negotiation = _mechanism->Begin();
+  running.cookie = _withCookie ? "negotiation=" + Pelmar::StringUtil::GenerateUuid() : "";
+  const std::string cookie = running.cookie;
   // 122 random bits: nobody guesses the name of somebody else's negotiation.
-  return Advance("urn:uuid:" + Pelmar::StringUtil::GenerateUuid(), std::move(running), request, context);
+  const std::string id = "urn:uuid:" + Pelmar::StringUtil::GenerateUuid();
+  NegotiationRound round = Advance(id, std::move(running), request, context);
+  round.cookie = cookie;
+  return round;
 }
 
 NegotiationRound Negotiator::Continue(const SecurityHeader& header, const TokenRequest& request,
-                                      const AuthenticationContext& context) {
+                                      const std::string& cookies, const AuthenticationContext& context) {
   RequireSupport(_mechanism);
   RequireNoCredentials(header);
-  return Advance(request.context, _table.Take(request.context, context.now), request, context);
+  RunningNegotiation running = _table.Take(request.context, context.now);
+  RequireCookie(running, cookies, context);
+  return Advance(request.context, std::move(running), request, context);
 }
 
 NegotiationRound Negotiator::Advance(const std::string& id, RunningNegotiation running,

@@ -27,6 +27,7 @@ constexpr std::size_t kMaxLegBytes = 128 * 1024;
 struct NegotiationRound {
   std::string context;           ///< The service's name for the negotiation.
   NegotiationLeg leg;            ///< What to answer.
+  std::string cookie;            ///< "name=value" for the client to keep; empty: none.
   std::optional<Caller> caller;  ///< Set when the negotiation has ended well.
   TokenRequest wishes;           ///< What its first message asked for.
 };
@@ -34,24 +35,27 @@ struct NegotiationRound {
 /// Safe to use from any thread.
 class Negotiator final {
  public:
-  /// Without a mechanism every negotiation is refused.
-  explicit Negotiator(const std::shared_ptr<const NegotiationMechanism>& mechanism) : _mechanism(mechanism) {}
+  /// Without a mechanism every negotiation is refused. `withCookie`: further legs must bring the cookie that
+  /// the first one got.
+  Negotiator(const std::shared_ptr<const NegotiationMechanism>& mechanism, bool withCookie)
+      : _mechanism(mechanism), _withCookie(withCookie) {}
 
   /// A negotiation's first message, which may prove a key by its signature but holds no other credentials.
   /// Throws Fault.
   NegotiationRound Start(const SoapMessage& message, const SecurityHeader& header,
                          const TokenRequest& request, const AuthenticationContext& context);
 
-  /// Every later message: it names the negotiation and brings the next leg. Throws Fault, after which the
-  /// negotiation is over.
+  /// Every later message: it names the negotiation and brings the next leg. `cookies` is the value of the
+  /// Cookie header. Throws Fault; a leg or a cookie that is not accepted ends the negotiation.
   NegotiationRound Continue(const SecurityHeader& header, const TokenRequest& request,
-                            const AuthenticationContext& context);
+                            const std::string& cookies, const AuthenticationContext& context);
 
  private:
   NegotiationRound Advance(const std::string& id, RunningNegotiation running, const TokenRequest& request,
                            const AuthenticationContext& context);
 
   std::shared_ptr<const NegotiationMechanism> _mechanism;
+  bool _withCookie;
   NegotiationTable _table;
 };
 

@@ -5,7 +5,6 @@
 
 #include "devsts/Fault.h"
 #include "devsts/PresentedToken.h"
-#include "devsts/Responses.h"
 #include "devsts/SecurityHeader.h"
 #include "devsts/SoapMessage.h"
 
@@ -32,8 +31,21 @@ bool IsXml(const std::string& contentType) {
 
 Answer MakeFaultAnswer(FaultCode code, const std::string& text, const std::string& reason,
                        RequestRecord& record) {
-  record.SetAnswer(500, ToText(code), reason);
-  return {500, kXmlContentType, MakeFault(code, text)};
+  record.SetAnswer(500, "fault");
+  record.SetReason(ToText(code), reason);
+  return {500, kXmlContentType, MakeFault(code, text), ""};
+}
+
+Answer MakeContentTypeAnswer(RequestRecord& record) {
+  record.SetAnswer(415, "refusal");
+  record.SetReason("", "content type");
+  return {415, "text/plain", "SOAP 1.1 requests have the content type text/xml.\n", ""};
+}
+
+Answer MakeNoAnswer(RequestRecord& record) {
+  record.SetAnswer(0, "none");
+  record.SetReason("", "dropped, as the service was told to");
+  return {};
 }
 
 /// The token that the request is about.
@@ -58,6 +70,13 @@ const User& GetSubject(const AssertionContent& content, const AuthenticationCont
 
 }  // namespace
 
+struct RequestHandler::Incoming {
+  const std::string& soapAction;
+  const std::string& contentType;
+  const std::string& body;
+  const std::string& cookie;
+};
+
 RequestHandler::RequestHandler(const HandlerOptions& options, const Directory& directory,
                                const TokenIssuer& issuer, const Clock& clock, const LogSink& log)
     : _options(options),
@@ -65,28 +84,25 @@ RequestHandler::RequestHandler(const HandlerOptions& options, const Directory& d
       _issuer(issuer),
       _clock(clock),
       _log(log),
-      _negotiator(options.negotiation) {}
+      _negotiator(options.negotiation, options.cookie),
+      _trouble(options.trouble) {}
 
 Answer RequestHandler::HandleRequest(const std::string& soapAction, const std::string& contentType,
-                                     const std::string& body) {
+                                     const std::string& body, const std::string& cookie) {
   RequestRecord record;
-  const Answer answer = Respond(soapAction, contentType, body, record);
+  const Answer answer = Respond({soapAction, contentType, body, cookie}, record);
   if (_log) {
     _log(record.ToJson(_clock()));
   }
   return answer;
 }
 
-Answer RequestHandler::Respond(const std::string& soapAction, const std::string& contentType,
-                               const std::string& body, RequestRecord& record) {
-  if (!IsXml(contentType)) {
-    record.SetAnswer(415, "", "content type");
-    return {415, "text/plain", "SOAP 1.1 requests have the content type text/xml.\n"};
+Answer RequestHandler::Respond(const Incoming& incoming, RequestRecord& record) {
+  if (!IsXml(incoming.contentType)) {
+    return MakeContentTypeAnswer(record);
   }
   try {
-    const std::string text = Process(soapAction, body, record);
-    record.SetAnswer(200, "", "");
-    return {200, kXmlContentType, text};
+    return Process(incoming, record);
   } catch (const Fault& fault) {
     return MakeFaultAnswer(fault.GetCode(), fault.what(), fault.what(), record);
   } catch (const std::exception& e) {
@@ -95,26 +111,39 @@ Answer RequestHandler::Respond(const std::string& soapAction, const std::string&
   }
 }
 
-std::string RequestHandler::Process(const std::string& soapAction, const std::string& body,
-                                    RequestRecord& record) {
-  const Operation operation = ReadAction(soapAction);
+/// Trouble comes before anything is looked at or changed.
+Answer RequestHandler::Process(const Incoming& incoming, RequestRecord& record) {
+  const Operation operation = ReadAction(incoming.soapAction);
   record.SetOperation(GetName(operation));
-  const SoapMessage message = ReadSoapMessage(body);
+  switch (_trouble.Draw()) {
+    case Trouble::DROP:
+      return MakeNoAnswer(record);
+    case Trouble::FAIL:
+      throw Fault(FaultCode::SERVER, "The service failed, as it was told to");
+    case Trouble::NONE:
+      break;
+  }
+  return Perform(operation, incoming, record);
+}
+
+Answer RequestHandler::Perform(Operation operation, const Incoming& incoming, RequestRecord& record) {
+  const SoapMessage message = ReadSoapMessage(incoming.body);
   const SecurityHeader header = ReadSecurityHeader(*message.security);
   const long long now = _clock();
   RequireFresh(header, now, _options.maxClockSkewSec * kMicrosecondsPerSecond);
   record.AddPassed("timestamp");
   const TokenRequest request = ReadTokenRequest(*message.request, operation);
+  record.SetAsked(request);
   const std::shared_ptr<const Directory> directory = GetDirectory();
   const AuthenticationContext context = {*directory, _issuer.GetCertificate(), _replays, now, record};
-  return Dispatch(message, header, request, context);
+  if (request.binaryExchange) {
+    return Negotiate(incoming, message, header, request, context);
+  }
+  return {200, kXmlContentType, Grant(message, header, request, context), ""};
 }
 
-std::string RequestHandler::Dispatch(const SoapMessage& message, const SecurityHeader& header,
-                                     const TokenRequest& request, const AuthenticationContext& context) {
-  if (request.binaryExchange) {
-    return Negotiate(message, header, request, context);
-  }
+std::string RequestHandler::Grant(const SoapMessage& message, const SecurityHeader& header,
+                                  const TokenRequest& request, const AuthenticationContext& context) {
   switch (request.operation) {
     case Operation::RENEW:
       return Renew(message, header, request, context);
@@ -125,27 +154,36 @@ std::string RequestHandler::Dispatch(const SoapMessage& message, const SecurityH
   }
 }
 
+IssuedToken RequestHandler::Sign(const AssertionContent& content, RequestRecord& record) const {
+  const IssuedToken token = {_issuer.Issue(content), content.notBefore, content.notOnOrAfter};
+  record.SetAnswer(200, "token");
+  record.SetGranted(content);
+  return token;
+}
+
 std::string RequestHandler::Issue(const SoapMessage& message, const SecurityHeader& header,
                                   const TokenRequest& request, const AuthenticationContext& context) {
   const Caller caller = Authenticate(message, header, context);
-  const AssertionContent content = Grant(caller, request, _options.lifetime, context.directory, context.now);
-  return MakeIssueResponse({_issuer.Issue(content), content.notBefore, content.notOnOrAfter});
+  return MakeIssueResponse(Sign(
+      DevSts::Grant(caller, request, _options.lifetime, context.directory, context.now), context.record));
 }
 
 /// One round of a negotiation. What is granted is what its first message asked for.
-std::string RequestHandler::Negotiate(const SoapMessage& message, const SecurityHeader& header,
-                                      const TokenRequest& request, const AuthenticationContext& context) {
+Answer RequestHandler::Negotiate(const Incoming& incoming, const SoapMessage& message,
+                                 const SecurityHeader& header, const TokenRequest& request,
+                                 const AuthenticationContext& context) {
   const NegotiationRound round = request.operation == Operation::CHALLENGE
-                                     ? _negotiator.Continue(header, request, context)
+                                     ? _negotiator.Continue(header, request, incoming.cookie, context)
                                      : _negotiator.Start(message, header, request, context);
   const std::string leg = Pelmar::StringUtil::Base64Encode(round.leg);
   if (!round.caller) {
-    return MakeChallengeResponse(round.context, leg);
+    context.record.SetAnswer(200, "challenge");
+    return {200, kXmlContentType, MakeChallengeResponse(round.context, leg), round.cookie};
   }
   const AssertionContent content =
-      Grant(*round.caller, round.wishes, _options.lifetime, context.directory, context.now);
-  return MakeNegotiatedResponse(round.context, leg,
-                                {_issuer.Issue(content), content.notBefore, content.notOnOrAfter});
+      DevSts::Grant(*round.caller, round.wishes, _options.lifetime, context.directory, context.now);
+  return {200, kXmlContentType, MakeNegotiatedResponse(round.context, leg, Sign(content, context.record)),
+          round.cookie};
 }
 
 /// Whoever holds the key that the token is bound to may renew it.
@@ -159,16 +197,18 @@ std::string RequestHandler::Renew(const SoapMessage& message, const SecurityHead
     throw Fault(FaultCode::INVALID_TOKEN, "The token is not bound to the key that signed the message");
   }
   const AssertionContent renewed = GrantRenewal(content, user, request, _options.lifetime, context.now);
-  return MakeRenewResponse({_issuer.Issue(renewed), renewed.notBefore, renewed.notOnOrAfter});
+  return MakeRenewResponse(Sign(renewed, context.record));
 }
 
 /// Answers whether the subject is one that the service still knows, by a token of its own. Anybody may ask.
 std::string RequestHandler::Validate(const TokenRequest& request, const AuthenticationContext& context) {
   try {
     GetSubject(ReadTarget(request, context), context);
+    context.record.SetAnswer(200, "valid");
     return MakeValidateResponse(true);
   } catch (const Fault& fault) {
     context.record.AddFailed(fault.what());
+    context.record.SetAnswer(200, "invalid");
     return MakeValidateResponse(false);
   }
 }

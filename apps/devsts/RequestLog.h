@@ -7,7 +7,11 @@
 #ifndef QUORLIN_DEVSTS_REQUESTLOG_H
 #define QUORLIN_DEVSTS_REQUESTLOG_H
 
+#include "devsts/Assertion.h"
+#include "devsts/TokenRequest.h"
+
 #include <functional>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -28,8 +32,15 @@ class RequestRecord final {
   void AddPassed(const std::string& check) { _passed.push_back(check); }
   /// A check that failed without the request failing with it.
   void AddFailed(const std::string& check) { _failed.push_back(check); }
-  /// The answer; `fault` is empty for a granted request.
-  void SetAnswer(int status, const std::string& fault, const std::string& reason);
+  /// What the client wishes for. Of texts only how many there are.
+  void SetAsked(const TokenRequest& request);
+  /// What the token is that the client gets.
+  void SetGranted(const AssertionContent& content);
+  /// The HTTP status and what the answer is: "token", "challenge", "valid", "invalid", "fault", "refusal" of
+  /// what is no SOAP, or "none".
+  void SetAnswer(int status, const std::string& answer);
+  /// Why the answer is not what was asked for; `fault` is empty unless it is one.
+  void SetReason(const std::string& fault, const std::string& reason);
 
   std::string ToJson(long long now) const;
 
@@ -38,7 +49,10 @@ class RequestRecord final {
   std::string _user;
   std::vector<std::string> _passed;
   std::vector<std::string> _failed;
+  std::optional<TokenRequest> _asked;
+  std::optional<AssertionContent> _granted;
   int _status = 0;
+  std::string _answer;
   std::string _fault;
   std::string _reason;
 };

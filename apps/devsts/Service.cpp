@@ -36,15 +36,34 @@ std::string MakeUrl(const ServiceConfig& config, std::uint16_t port) {
   return (config.tls ? "https://" : "http://") + host + ":" + std::to_string(port) + kServicePath;
 }
 
-HttpResponse Respond(RequestHandler& handler, const HttpRequest& request) {
+HttpResponse MakeResponse(int status, const std::string& contentType, std::string body) {
+  HttpResponse response;
+  response.status = status;
+  response.contentType = contentType;
+  response.body = std::move(body);
+  return response;
+}
+
+/// Nobody but this service, and over TLS nobody who listens, is to see the cookie (RFC 6265, section 4.1.2).
+std::string MakeSetCookie(const std::string& cookie, bool tls) {
+  return cookie.empty() ? "" : cookie + "; Path=" + kServicePath + "; HttpOnly" + (tls ? "; Secure" : "");
+}
+
+HttpResponse Respond(RequestHandler& handler, const HttpRequest& request, bool tls) {
   if (request.target != kServicePath) {
-    return {404, "text/plain", std::string("The token service is at ") + kServicePath + ".\n", ""};
+    return MakeResponse(404, "text/plain", std::string("The token service is at ") + kServicePath + ".\n");
   }
   if (request.method != "POST") {
-    return {405, "text/plain", "SOAP requests are posted.\n", "POST"};
+    HttpResponse response = MakeResponse(405, "text/plain", "SOAP requests are posted.\n");
+    response.allow = "POST";
+    return response;
   }
-  Answer answer = handler.HandleRequest(request.soapAction, request.contentType, request.body);
-  return {answer.status, answer.contentType, std::move(answer.body), ""};
+  Answer answer =
+      handler.HandleRequest(request.soapAction, request.contentType, request.body, request.cookie);
+  HttpResponse response = MakeResponse(answer.status, answer.contentType, std::move(answer.body));
+  response.setCookie = MakeSetCookie(answer.cookie, tls);
+  response.isDropped = answer.status == 0;
+  return response;
 }
 
 }  // namespace
@@ -58,11 +77,15 @@ Service::Service(const ServiceConfig& config)
   options.address = config.address;
   options.port = config.port;
   if (config.tls) {
-    options.tls = _authority.IssueServer(GetServerNames(config));
+    options.tls = config.server ? *config.server : _authority.IssueServer(GetServerNames(config));
     _serverCertificate = options.tls->certificate;
   }
   _server = std::make_unique<HttpServer>(
-      options, [this](const HttpRequest& request) { return Respond(_handler, request); });
+      options, [this, tls = config.tls, delay = config.delay](const HttpRequest& request) {
+        HttpResponse response = Respond(_handler, request, tls);
+        response.delay = delay;
+        return response;
+      });
   _url = MakeUrl(config, _server->GetPort());
 }
 

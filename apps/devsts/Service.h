@@ -12,6 +12,7 @@
 #include "devsts/RequestHandler.h"
 #include "devsts/RequestLog.h"
 
+#include <chrono>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -31,9 +32,13 @@ struct ServiceConfig {
   HandlerOptions handler;
   /// By how many seconds the service's clock is ahead of the system's.
   long long clockOffsetSec = 0;
+  /// How long every answer is held back.
+  std::chrono::milliseconds delay{0};
   /// What the tokens are signed with; absent: a new key with a certificate from the service's own authority.
   std::optional<Identity> signer;
-  /// The names in the TLS certificate; empty: localhost, its addresses, and `address`.
+  /// What TLS clients are shown; absent: a new key with a certificate from the service's own authority.
+  std::optional<Identity> server;
+  /// The names in the new TLS certificate; empty: localhost, its addresses, and `address`.
   std::vector<std::string> serverNames;
   /// Takes the request log; empty: nobody does.
   LogSink log;

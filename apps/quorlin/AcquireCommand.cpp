@@ -7,6 +7,7 @@
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
 #include "quorlin/Password.h"
+#include "quorlin/Progress.h"
 #include "quorlin/TokenFile.h"
 
 #include <quorlin/SecurityTokenService.h>
@@ -41,20 +42,24 @@ TokenPointer AcquireByPassword(const AcquireArguments& arguments) {
     std::cerr << "quorlin: warning: with an http: URL the password can be read on its way\n";
   }
   const Secret password = ReadPassword(arguments.password, arguments.userName);
+  const Progress progress;
   return service->AcquireToken(arguments.userName, password.Reveal(), spec);
 }
 
 TokenPointer AcquireByCertificate(const AcquireArguments& arguments) {
+  const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
+  const Progress progress;
   return Quorlin::CreateSecurityTokenService(MakeServiceConfig(arguments.service, arguments.holderOfKey))
-      ->AcquireTokenByCertificate(MakeTokenSpec(arguments.token));
+      ->AcquireTokenByCertificate(spec);
 }
 
 TokenPointer AcquireByToken(const AcquireArguments& arguments) {
   const Quorlin::SecurityTokenServiceConfig config =
       MakeServiceConfig(arguments.service, arguments.holderOfKey);
   const TokenPointer presented = ReadToken(arguments.presentedTokenFile, config);
-  return Quorlin::CreateSecurityTokenService(config)->AcquireTokenByToken(*presented,
-                                                                          MakeTokenSpec(arguments.token));
+  const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
+  const Progress progress;
+  return Quorlin::CreateSecurityTokenService(config)->AcquireTokenByToken(*presented, spec);
 }
 
 /// Adds the flags that all have.

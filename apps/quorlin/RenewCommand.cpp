@@ -6,6 +6,7 @@
 #include "quorlin/Commands.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
+#include "quorlin/Progress.h"
 #include "quorlin/TokenFile.h"
 
 #include <quorlin/SecurityTokenService.h>
@@ -28,6 +29,7 @@ boost::shared_ptr<const Quorlin::SamlToken> Renew(const RenewArguments& argument
   const Quorlin::SecurityTokenServiceConfig config =
       MakeServiceConfig(arguments.service, arguments.holderOfKey);
   const boost::shared_ptr<const Quorlin::SamlToken> token = ReadToken(arguments.tokenFile, config);
+  const Progress progress;
   return Quorlin::CreateSecurityTokenService(config)->RenewToken(*token, arguments.token.lifetimeSec);
 }
 

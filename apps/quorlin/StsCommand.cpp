@@ -16,6 +16,7 @@
 #include "devsts/Service.h"
 #include "devsts/ToyNegotiation.h"
 
+#include <chrono>
 #include <filesystem>
 #include <iostream>
 #include <memory>
@@ -27,6 +28,9 @@ namespace Cli {
 
 namespace {
 
+/// Longer than any client waits.
+constexpr long long kMaxDelayMs = 10LL * 60 * 1000;
+
 struct StsArguments {
   DevSts::ServiceConfig config;
   bool plainHttp = false;
@@ -37,6 +41,7 @@ struct StsArguments {
   unsigned toyLegs = 0;
   std::string keytabFile;
   std::string kerberosService;
+  long long delayMs = 0;
 };
 
 void AddKerberosOptions(CLI::App& command, StsArguments& arguments) {
@@ -85,6 +90,7 @@ DevSts::Identity ReadSigner(const StsArguments& arguments) {
 DevSts::ServiceConfig MakeConfig(const StsArguments& arguments) {
   DevSts::ServiceConfig config = arguments.config;
   config.tls = !arguments.plainHttp;
+  config.delay = std::chrono::milliseconds(arguments.delayMs);
   config.log = MakeStandardErrorLog();
   if (!arguments.directoryFile.empty()) {
     config.directory = ReadDirectory(arguments.directoryFile);
@@ -141,6 +147,28 @@ void RunSts(const StsArguments& arguments) {
   service->Stop();
 }
 
+/// Switches that make the service a difficult one.
+void AddTroubleOptions(CLI::App& command, StsArguments& arguments) {
+  DevSts::HandlerOptions& handler = arguments.config.handler;
+  command.add_option("--delay-ms", arguments.delayMs, "Hold every answer back for so long")
+      ->type_name("N")
+      ->check(CLI::Range(0LL, kMaxDelayMs));
+  command
+      .add_option("--fail", handler.trouble.failRate,
+                  "Answer this share of the requests, from 0 to 1, by a SOAP fault soapenv:Server")
+      ->type_name("RATE")
+      ->check(CLI::Range(0.0, 1.0));
+  command
+      .add_option("--drop", handler.trouble.dropRate,
+                  "Close the connection on this share of the requests, from 0 to 1, without an answer")
+      ->type_name("RATE")
+      ->check(CLI::Range(0.0, 1.0));
+  command.add_option("--seed", handler.trouble.seed, "Let --fail and --drop hit the same requests each time")
+      ->type_name("N");
+  command.add_flag("--cookie", handler.cookie,
+                   "Give a cookie to whoever begins a negotiation, and want it back with each further leg");
+}
+
 }  // namespace
 
 Command AddStsCommand(CLI::App& app) {
@@ -194,6 +222,7 @@ Command AddStsCommand(CLI::App& app) {
       ->type_name("LEGS")
       ->check(CLI::Range(1U, DevSts::kMaxToyLegs));
   AddKerberosOptions(*command, *arguments);
+  AddTroubleOptions(*command, *arguments);
   command->footer(
       "Prints one JSON line when it is ready: {\"url\":...,\"ca\":...,\"stsCert\":...}. Writes one JSON line for each\n"
       "request to standard error. Ends on Ctrl-C.\n\n"

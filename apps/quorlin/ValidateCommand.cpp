@@ -6,6 +6,7 @@
 #include "quorlin/Commands.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
+#include "quorlin/Progress.h"
 #include "quorlin/Terminal.h"
 #include "quorlin/TokenFile.h"
 #include "quorlin/TokenOutput.h"
@@ -33,11 +34,16 @@ std::string DescribeVerdict(const Quorlin::SamlToken& token, bool isValid, bool 
          (isValid ? " is a valid subject\n" : " is no longer a valid subject\n");
 }
 
+bool AskService(const Quorlin::SecurityTokenServiceConfig& config, const Quorlin::SamlToken& token) {
+  const Progress progress;
+  return Quorlin::CreateSecurityTokenService(config)->ValidateSubject(token);
+}
+
 int Validate(const ValidateArguments& arguments) {
   try {
     const Quorlin::SecurityTokenServiceConfig config = MakeServiceConfig(arguments.service);
     const boost::shared_ptr<const Quorlin::SamlToken> token = ReadToken(arguments.tokenFile, config);
-    const bool isValid = Quorlin::CreateSecurityTokenService(config)->ValidateSubject(*token);
+    const bool isValid = AskService(config, *token);
     Print(DescribeVerdict(*token, isValid, arguments.json));
     return isValid ? EXIT_DONE : EXIT_REFUSED;
   } catch (...) {

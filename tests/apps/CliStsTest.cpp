@@ -15,6 +15,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <chrono>
 #include <csignal>
 #include <filesystem>
 #include <fstream>
@@ -197,39 +198,202 @@ TEST(CliSts, RefusesAToyMechanismOfNoLegsOrTooMany) {
   }
 }
 
+/// What a service with these switches makes of a good request: the exit code and what was printed.
+ProcessResult AcquireFrom(const std::vector<std::string>& switches) {
+  std::vector<std::string> arguments = {"sts"};
+  arguments.insert(arguments.end(), switches.begin(), switches.end());
+  const RunningSts sts(arguments);
+  return sts.Acquire("alice@example.com", "secret");
+}
+
+TEST(CliSts, FailsWhenToldTo) {
+  const ProcessResult result = AcquireFrom({"--fail", "1"});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(Json::parse(result.standardOutput).at("error").at("message"),
+            "Unexpected SOAP fault: soapenv:Server; request failed.");
+}
+
+TEST(CliSts, DropsConnectionsWhenToldTo) {
+  const ProcessResult result = AcquireFrom({"--drop", "1"});
+  EXPECT_EQ(result.exitCode, 3);
+  EXPECT_EQ(Json::parse(result.standardOutput).at("error").at("type"), "CommunicationException");
+}
+
+/// The exit codes of some requests to a service with this seed.
+std::string StoryOf(const std::string& seed) {
+  const RunningSts sts({"sts", "--fail", "0.4", "--drop", "0.3", "--seed", seed});
+  std::string story;
+  for (int i = 0; i < 8; ++i) {
+    story += std::to_string(sts.Acquire("alice@example.com", "secret").exitCode);
+  }
+  return story;
+}
+
+TEST(CliSts, RepeatsItsTroubleForTheSameSeed) {
+  EXPECT_EQ(StoryOf("7"), "03303011");
+}
+
+TEST(CliSts, HoldsAnswersBackWhenToldTo) {
+  const auto start = std::chrono::steady_clock::now();
+  EXPECT_EQ(AcquireFrom({"--delay-ms", "50"}).exitCode, 0);
+  EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(50));
+}
+
+TEST(CliSts, CutsLifetimesDown) {
+  const ProcessResult result = AcquireFrom({"--max-lifetime", "60"});
+  EXPECT_EQ(result.exitCode, 0);
+  const Json token = Json::parse(result.standardOutput).at("token");
+  const auto toTime = [&](const char* name) {
+    return Pelmar::System::DateTime(token.at(name).get<std::string>()).GetUtcTime();
+  };
+  EXPECT_EQ(toTime("endDate") - toTime("startDate"), 60LL * 1000000);
+}
+
+TEST(CliSts, LetsItsClockBeWrong) {
+  for (const char* const offset : {"3600", "-3600"}) {
+    const ProcessResult result = AcquireFrom({"--clock-offset", offset});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_EQ(Json::parse(result.standardOutput).at("error").at("message"),
+              "Unexpected SOAP fault: wst:RequestFailed; request failed.");
+  }
+}
+
+TEST(CliSts, GivesACookieAndWantsItBack) {
+  const RunningSts sts({"sts", "--cookie", "--toy-negotiation", "2"});
+  Cli::ToyNegotiationHandler handler(DevSts::ToyOptions(), "bob@example.com", "builder");
+  EXPECT_EQ(Connect(sts)->AcquireTokenByGSS(TenMinutes(), handler)->GetSubject().name, "bob");
+}
+
+TEST(CliSts, RefusesSwitchesOutOfRange) {
+  const std::vector<std::vector<std::string>> bad = {
+      {"--fail", "1.5"}, {"--drop", "-0.1"}, {"--delay-ms", "-1"}, {"--max-lifetime", "0"}, {"--seed", "x"}};
+  for (const std::vector<std::string>& arguments : bad) {
+    const ProcessResult result = RunCli({"sts", arguments[0], arguments[1]});
+    EXPECT_EQ(result.exitCode, 2) << arguments[0];
+    EXPECT_EQ(result.standardOutput, "") << arguments[0];
+  }
+}
+
+/// Standard error of the program, which a shell puts into a file.
+TEST(CliSts, LogsOneLineForEachRequest) {
+  const TestSupport::TemporaryDirectory files;
+  const std::string log = files.GetPath("log");
+  ChildProcess process({"/bin/sh", "-c", "exec \"$0\" sts --http 2>\"$1\"", QUORLIN_CLI_PATH, log},
+                       ChildProcess::Terminal::NONE);
+  const Json ready = Json::parse(process.ReadUntil("\n"));
+  for (const char* const password : {"secret", "guess"}) {
+    RunCli({"acquire", "password", "--password-stdin", "--user", "alice@example.com", "--url",
+            ready.at("url"), "--sts-cert", ready.at("stsCert")},
+           password);
+  }
+  process.Signal(SIGTERM);
+  EXPECT_EQ(process.Wait(), 0);
+  const std::string head =
+      R"({"time":0,"operation":"issue","user":"alice@example.com","asked":{"confirmation":"bearer","lifetimeSec":600,)"
+      R"("renewable":false,"delegable":false,"delegates":false,"audiences":0,"advices":0},)";
+  EXPECT_EQ(std::regex_replace(ReadFile(log), std::regex("\"time\":\"[^\"]*\""), "\"time\":0"),
+            head +
+                R"("passed":["timestamp","password"],"status":200,"answer":"token",)"
+                R"("granted":{"confirmation":"bearer","lifetimeSec":600}})"
+                "\n" +
+                head +
+                R"("passed":["timestamp"],"status":500,"answer":"fault","fault":"wst:FailedAuthentication",)"
+                R"("reason":"Invalid user name or password"})"
+                "\n");
+}
+
+// ---- Waiting ----
+
+/// Acquires from a service that takes longer than a second.
+std::vector<std::string> SlowAcquire(const ServiceWithFiles& service, const std::string& passwordFile) {
+  return MakeCommand({"acquire", "password", "--json", "--url", service.Get().GetUrl(), "--ca",
+                      service.GetFiles().GetPath("ca.pem"), "--sts-cert",
+                      service.GetFiles().GetPath("sts.pem"), "--user", "alice@example.com", "--password-file",
+                      passwordFile});
+}
+
+DevSts::ServiceConfig Slow() {
+  DevSts::ServiceConfig config;
+  config.delay = std::chrono::milliseconds(2500);
+  return config;
+}
+
+TEST(CliProgress, ShowsSecondsOnATerminalAndTakesThemAway) {
+  const ServiceWithFiles service(Slow());
+  ChildProcess process(SlowAcquire(service, service.GetFiles().WriteFile("password", "secret")),
+                       ChildProcess::Terminal::OWN);
+  const std::string output = process.ReadAll();
+  EXPECT_EQ(process.Wait(), 0);
+  const std::string token = output.substr(output.find('{'));
+  const std::string wait = "\r\x1b[KWaiting for the service ... ";
+  EXPECT_EQ(output.substr(0, output.find('{')), wait + "1 s" + wait + "2 s\r\x1b[K");
+  EXPECT_EQ(Json::parse(token).at("token").at("subject").at("name"), "alice");
+}
+
+TEST(CliProgress, ShowsNothingElsewhere) {
+  const ServiceWithFiles service(Slow());
+  const ProcessResult result =
+      TestSupport::RunProcess(SlowAcquire(service, service.GetFiles().WriteFile("password", "secret")), "");
+  EXPECT_EQ(result.exitCode, 0);
+  EXPECT_EQ(result.standardError, "");
+}
+
+TEST(CliProgress, ShowsNothingOfWorkThatIsDoneAtOnce) {
+  const ServiceWithFiles service;
+  ChildProcess process(SlowAcquire(service, service.GetFiles().WriteFile("password", "guess")),
+                       ChildProcess::Terminal::OWN);
+  EXPECT_EQ(process.ReadAll().front(), '{');
+  EXPECT_EQ(process.Wait(), 1);
+}
+
+/// The demo's words without what differs from run to run.
+std::string MaskStory(std::string story) {
+  story = std::regex_replace(story, std::regex("\\([0-9.]+ m?s\\)"), "(time)");
+  story = std::regex_replace(story, std::regex("127\\.0\\.0\\.1:(?!8443/)[0-9]+/"), "127.0.0.1:PORT/");
+  story = std::regex_replace(story, std::regex("[0-9-]{10}T[0-9:.]+Z"), "DATE");
+  story = std::regex_replace(story, std::regex("_[0-9a-f-]{36}"), "ID");
+  story = std::regex_replace(story, std::regex("SHA-256 [0-9a-fA-F:]+"), "SHA-256 DIGEST");
+  return std::regex_replace(story, std::regex("\\([0-9]+ min( [0-9]+ s)? left\\)"), "(left)");
+}
+
 TEST(CliDemo, TellsTheStory) {
   const ProcessResult result = RunCli({"demo"});
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(result.standardError, "");
-  std::string story = std::regex_replace(result.standardOutput, std::regex("\\([0-9.]+ m?s\\)"), "(time)");
-  story = std::regex_replace(story, std::regex("127\\.0\\.0\\.1:(?!8443/)[0-9]+/"), "127.0.0.1:PORT/");
-  story = std::regex_replace(story, std::regex("[0-9-]{10}T[0-9:.]+Z"), "DATE");
-  story = std::regex_replace(story, std::regex("_[0-9a-f-]{36}"), "ID");
-  story = std::regex_replace(story, std::regex("\\([0-9]+ min( [0-9]+ s)? left\\)"), "(left)");
   EXPECT_EQ(
-      story,
-      "1. Starting a token service with new keys and certificates ... https://127.0.0.1:PORT/sts (time)\n"
-      "2. Asking it over HTTPS for a token for alice@example.com, by password ... got one, its signature and dates "
-      "are good (time)\n"
-      "\n"
-      "  subject       alice@example.com\n"
-      "  full name     Alice Example\n"
-      "  groups        Administrators@example.com\n"
-      "                Staff@example.com\n"
-      "  valid from    DATE\n"
-      "  valid until   DATE (left)\n"
-      "  flags         renewable, not delegable\n"
-      "  confirmation  bearer: whoever holds it may use it\n"
-      "  id            ID\n"
-      "\n"
-      "3. Asking again with a wrong password ... refused, as it should be: Authentication failed: Invalid user name "
-      "or password (time)\n"
-      "4. Stopping the service and removing its files ... done (time)\n"
-      "\n"
-      "To try it by hand, run a service in one terminal and ask it in another:\n"
-      "  quorlin sts --port 8443 --write-certs certs\n"
-      "  quorlin acquire password --url https://127.0.0.1:8443/sts --ca certs/ca.pem --sts-cert certs/sts.pem \\\n"
-      "      --user alice@example.com          (the password is: secret)\n");
+      MaskStory(result.standardOutput),
+      R"(1. Starting a token service with new keys and certificates ... https://127.0.0.1:PORT/sts (time)
+2. Asking it over HTTPS for a token for alice@example.com, by password ... got a token that whoever holds it may use (time)
+3. The same with a wrong password ... refused, as it should be: Authentication failed: Invalid user name or password (time)
+4. The same with her password, signed with her key ... got a token that only her key makes good (time)
+5. Without the password, by her certificate and key ... got a token that only her key makes good (time)
+6. Negotiating in 3 legs (SPNEGO, by a toy mechanism) ... got a token that whoever holds it may use (time)
+7. Asking for 20 tokens at once, asynchronously ... got 20 different tokens (time)
+8. Exchanging her token for one with which bob@example.com may act for her ... got one, delegated to bob (time)
+9. Exchanging it for one that only https://files.example.com accepts ... got one (time)
+10. Renewing that for 5 minutes ... got one (time)
+11. Asking whether its subject is still valid ... yes (time)
+12. The service forgets her; asking again ... no (time)
+13. Stopping the service and removing its files ... done (time)
+
+The last token:
+  subject       alice@example.com
+  full name     Alice Example
+  groups        Administrators@example.com
+                Staff@example.com
+  valid from    DATE
+  valid until   DATE (left)
+  flags         renewable, delegable
+  confirmation  holder-of-key: needs the key of CN=Alice Example
+                certificate SHA-256 DIGEST
+  audience      https://files.example.com
+  id            ID
+
+To try it by hand, run a service in one terminal and ask it in another:
+  quorlin sts --port 8443 --write-certs certs
+  quorlin acquire password --url https://127.0.0.1:8443/sts --ca certs/ca.pem --sts-cert certs/sts.pem \
+      --user alice@example.com          (the password is: secret)
+)");
 }
 
 /// The signal is there before the program is, so that it always meets it at work.

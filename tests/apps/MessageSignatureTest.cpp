@@ -69,8 +69,8 @@ class Handler final {
                  DevSts::LogSink()) {}
 
   /// "issued" and the answer's body in `body`, or the fault: "code: text".
-  std::string Handle(const std::string& request) {
-    body = _handler.HandleRequest(kIssueAction, kXml, request).body;
+  std::string Handle(const std::string& request, const std::string& action = kIssueAction) {
+    body = _handler.HandleRequest(action, kXml, request).body;
     if (body.find("<soapenv:Fault>") == std::string::npos) {
       return "issued";
     }
@@ -209,6 +209,10 @@ const Attack kAttacks[] = {
      "wst:FailedAuthentication: The message's signature does not refer to the message's certificate"},
     {"OtherSignatureMethod", "xmldsig-more#rsa-sha256\"", "xmldsig-more#rsa-sha512\"",
      "wst:FailedAuthentication: The message's signature uses unexpected algorithms"},
+    {"OtherElementCovered", "URI=\"#Body", "URI=\"#other",
+     "wst:FailedAuthentication: The message's signature covers something else than Body and Timestamp"},
+    {"OtherCertificateType", "#X509v3\" wsu:Id", "#PKCS7\" wsu:Id",
+     "wsse:InvalidSecurityToken: Only X.509 v3 certificates in base64 are accepted"},
     {"SecondSignature", "</wsse:Security>",
      "<ds:Signature xmlns:ds=\"http://www.w3.org/2000/09/xmldsig#\"/></wsse:Security>",
      "soapenv:Client: The security header holds an unknown or repeated Signature"},
@@ -248,6 +252,135 @@ TEST(MessageSignature, WithACertificateThatIsNoneIsRefused) {
   Handler handler;
   EXPECT_EQ(handler.Handle(ReplaceOnce(CertificateRequest(), Base64Of(KnownClient()), "AAAA")),
             "wsse:InvalidSecurityToken: The BinarySecurityToken holds no certificate");
+}
+
+TEST(MessageSignature, MustCoverBodyAndTimestamp) {
+  Handler handler;
+  EXPECT_EQ(handler.Handle(CutOut(CertificateRequest(), "<ds:Reference ", "</ds:Reference>")),
+            "wst:FailedAuthentication: The message's signature does not cover Body and Timestamp");
+}
+
+TEST(MessageSignature, UsesOneDigestOnly) {
+  Handler handler;
+  EXPECT_EQ(handler.Handle(ReplaceAll(CertificateRequest(), "xmlenc#sha256\"", "xmlenc#sha512\"")),
+            "wst:FailedAuthentication: The message's signature has a reference with unexpected algorithms");
+}
+
+/// The Id of a signature is not signed.
+TEST(MessageSignature, IsTheOneThatUseKeyNames) {
+  Handler handler;
+  EXPECT_EQ(
+      handler.Handle(ReplaceOnce(CertificateRequest(), " Id=\"holderOfKeyProofSignature\"", " Id=\"x\"")),
+      "wst:RequestFailed: UseKey does not name the message's signature");
+}
+
+// ---- Tokens that are presented ----
+
+constexpr const char* kRenewAction = "\"http://docs.oasis-open.org/ws-sx/ws-trust/200512/RST/Renew\"";
+constexpr const char* kValidateAction = "\"http://docs.oasis-open.org/ws-sx/ws-trust/200512/RST/Validate\"";
+constexpr const char* kChallengeAction = "\"http://docs.oasis-open.org/ws-sx/ws-trust/200512/RSTR/Issue\"";
+
+boost::shared_ptr<Quorlin::SamlToken> AcquireToken(Handler& handler, const Quorlin::TokenSpec& spec) {
+  Quorlin::Request request;
+  MakeBuilder(KnownClient()).BuildCertificateTokenRequest(spec, request);
+  EXPECT_EQ(handler.Handle(request.body), "issued");
+  return ReadToken(handler.body);
+}
+
+std::string ExchangeRequest(const Quorlin::SamlToken& token, const Quorlin::TokenSpec& spec = MakeSpec()) {
+  Quorlin::Request request;
+  MakeBuilder(KnownClient()).BuildExchangeTokenRequest(token, spec, request);
+  return request.body;
+}
+
+std::string RenewRequest(const Quorlin::SamlToken& token, const Identity& client = KnownClient()) {
+  Quorlin::Request request;
+  MakeBuilder(client).BuildRenewRequest(token, 600, request);
+  return request.body;
+}
+
+TEST(PresentedToken, IsExchangedWithProofOfItsKeyOnly) {
+  Handler handler;
+  const auto token = AcquireToken(handler, MakeSpec());
+  const std::string request = ExchangeRequest(*token);
+  const std::size_t start = request.rfind("<ds:Signature ");
+  const std::string close = "</ds:Signature>";
+  const std::string isUnsigned =
+      request.substr(0, start) + request.substr(request.rfind(close) + close.size());
+  EXPECT_EQ(handler.Handle(isUnsigned),
+            "wst:FailedAuthentication: The message must be signed with the key that the token is bound to");
+  EXPECT_EQ(handler.Handle(ReplaceOnce(request, "saml-token-profile-1.1#SAMLID", "saml-token-profile-1.1#X")),
+            "wst:FailedAuthentication: The message's signature does not refer to the message's assertion");
+  EXPECT_EQ(handler.Handle(request), "issued");
+  EXPECT_EQ(handler.Handle(request), "wst:FailedAuthentication: The message was sent before");
+}
+
+TEST(PresentedToken, StandsAlone) {
+  Handler handler;
+  const auto token = AcquireToken(handler, MakeSpec());
+  EXPECT_EQ(
+      handler.Handle(ReplaceOnce(ExchangeRequest(*token), "</wsse:Security>",
+                                 "<wsse:UsernameToken><wsse:Username>robot</wsse:Username><wsse:Password "
+                                 "Type=\"http://docs.oasis-open.org/wss/2004/01/"
+                                 "oasis-200401-wss-username-token-profile-1.0#PasswordText\">oil"
+                                 "</wsse:Password></wsse:UsernameToken></wsse:Security>")),
+      "wsse:InvalidSecurityToken: The security header holds several credentials");
+}
+
+TEST(PresentedToken, MustBeAsTheServiceSignedIt) {
+  Handler handler;
+  const auto token = AcquireToken(handler, MakeSpec());
+  EXPECT_EQ(
+      handler.Handle(ReplaceOnce(ExchangeRequest(*token), ">robot@example.com<", ">admin@example.com<")),
+      "wsse:InvalidSecurityToken: The token was changed");
+  const std::string uri = "<ds:Reference URI=\"#" + token->GetId() + "\"";
+  EXPECT_EQ(handler.Handle(ReplaceOnce(ExchangeRequest(*token), uri, "<ds:Reference URI=\"\"")),
+            "wsse:InvalidSecurityToken: The token's signature does not cover it");
+}
+
+TEST(PresentedToken, GivesNoWiderAudienceAndNoFurtherDelegation) {
+  Handler handler;
+  Quorlin::TokenSpec narrow = MakeSpec();
+  narrow.audienceRestriction = {"urn:one"};
+  const auto token = AcquireToken(handler, narrow);
+  Quorlin::TokenSpec wide = MakeSpec();
+  wide.audienceRestriction = {"urn:two"};
+  EXPECT_EQ(handler.Handle(ExchangeRequest(*token, wide)),
+            "wst:RequestFailed: The audience is wider than that of the presented token");
+  Quorlin::TokenSpec delegated = MakeSpec();
+  delegated.delegateTo = std::string("robot@example.com");
+  EXPECT_EQ(handler.Handle(ExchangeRequest(*token, delegated)),
+            "wst:RequestFailed: The identity may not be delegated any further");
+}
+
+TEST(PresentedToken, IsRenewedWhenItIsRenewableAndGood) {
+  Handler handler;
+  EXPECT_EQ(handler.Handle(RenewRequest(*AcquireToken(handler, MakeSpec())), kRenewAction),
+            "wst:RequestFailed: The token may not be renewed");
+  Quorlin::TokenSpec renewable = MakeSpec();
+  renewable.renewable = true;
+  const auto token = AcquireToken(handler, renewable);
+  EXPECT_EQ(handler.Handle(RenewRequest(*token, MakeClient(4)), kRenewAction),
+            "wst:InvalidSecurityToken: The token is not bound to the key that signed the message");
+  const std::string request = RenewRequest(*token);
+  EXPECT_EQ(handler.Handle(request, kRenewAction), "issued");
+  EXPECT_EQ(handler.Handle(request, kRenewAction), "wst:FailedAuthentication: The message was sent before");
+}
+
+TEST(PresentedToken, MustBeThereToBeWorkedOn) {
+  Handler handler;
+  const std::string trust = "http://docs.oasis-open.org/ws-sx/ws-trust/200512";
+  const std::string now = DevSts::ToDateText(DevSts::MakeSystemClock(0)());
+  const std::string soon = DevSts::ToDateText(DevSts::MakeSystemClock(60)());
+  const std::string timestamp = "<wsu:Timestamp><wsu:Created>" + now + "</wsu:Created><wsu:Expires>" + soon +
+                                "</wsu:Expires></wsu:Timestamp>";
+  EXPECT_EQ(handler.Handle(Envelope(timestamp, "<wst:RequestSecurityToken><wst:TokenType>" + trust +
+                                                   "/RSTR/Status</wst:TokenType><wst:RequestType>" + trust +
+                                                   "/Validate</wst:RequestType></wst:RequestSecurityToken>"),
+                           kValidateAction),
+            "soapenv:Client: The request names no token to work on");
+  EXPECT_EQ(handler.Handle(Envelope(timestamp, "<wst:RequestSecurityToken/>"), kChallengeAction),
+            "soapenv:Client: The body must hold a RequestSecurityTokenResponse");
 }
 
 /// The signed Body is moved out of the way, and another one put into its place.

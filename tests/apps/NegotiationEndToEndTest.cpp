@@ -16,7 +16,9 @@
 
 #include <future>
 #include <memory>
+#include <mutex>
 #include <string>
+#include <vector>
 
 namespace {
 
@@ -89,6 +91,33 @@ TEST(NegotiationEndToEnd, GetsATokenBoundToAKey) {
   const TokenPointer token =
       Quorlin::CreateSecurityTokenService(config)->AcquireTokenByGSS(MakeSpec(), handler);
   EXPECT_EQ(token->GetConfirmationCertificate()->GetSha256(), identity.certificate->GetSha256());
+}
+
+/// The library keeps one session for a whole negotiation, cookies included.
+TEST(NegotiationEndToEnd, BringsTheServicesCookieBack) {
+  for (const bool tls : {true, false}) {
+    DevSts::ServiceConfig config;
+    config.tls = tls;
+    config.handler.cookie = true;
+    std::vector<std::string> lines;
+    std::mutex mutex;
+    config.log = [&](const std::string& line) {
+      const std::lock_guard<std::mutex> lock(mutex);
+      lines.push_back(line);
+    };
+    config.handler.negotiation =
+        std::make_shared<DevSts::ToyMechanism>(Legs(3), config.directory, DevSts::MakeSystemClock(0));
+    DevSts::Service service(config);
+    ToyNegotiationHandler handler(Legs(3), kAlice, "secret");
+    EXPECT_NE(
+        Quorlin::CreateSecurityTokenService(MakeConfig(service))->AcquireTokenByGSS(MakeSpec(), handler),
+        nullptr);
+    service.Stop();
+    ASSERT_EQ(lines.size(), 3U);
+    for (const std::size_t i : {1U, 2U}) {
+      EXPECT_NE(lines[i].find("\"passed\":[\"timestamp\",\"cookie\""), std::string::npos) << lines[i];
+    }
+  }
 }
 
 TEST(NegotiationEndToEnd, ReportsAWrongProof) {

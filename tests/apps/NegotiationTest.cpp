@@ -22,6 +22,7 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <regex>
 #include <set>
 #include <string>
 #include <tuple>
@@ -59,16 +60,18 @@ class Desk final {
  public:
   explicit Desk(const ToyOptions& options) : Desk(MakeToy(options)) {}
 
-  explicit Desk(const std::shared_ptr<const DevSts::NegotiationMechanism>& mechanism) {
+  explicit Desk(const std::shared_ptr<const DevSts::NegotiationMechanism>& mechanism,
+                bool withCookie = false) {
     DevSts::HandlerOptions options;
     options.negotiation = mechanism;
+    options.cookie = withCookie;
     _handler = std::make_unique<DevSts::RequestHandler>(
         options, DevSts::Directory::MakeSample(), Issuer(), GetClock(),
         [this](const std::string& line) { lines.push_back(line); });
   }
 
-  DevSts::Answer Send(const Quorlin::Request& request) {
-    return _handler->HandleRequest("\"" + request.soapAction + "\"", kXml, request.body);
+  DevSts::Answer Send(const Quorlin::Request& request, const std::string& cookie = "") {
+    return _handler->HandleRequest("\"" + request.soapAction + "\"", kXml, request.body, cookie);
   }
   DevSts::Answer Send(const std::string& action, const std::string& body) {
     return _handler->HandleRequest(action, kXml, body);
@@ -576,6 +579,63 @@ INSTANTIATE_TEST_SUITE_P(Table, NegotiationReads,
                          testing::Values("spnego-initial-bearer.xml", "spnego-initial-bearer-full.xml",
                                          "spnego-initial-holder-of-key-delegate.xml", "spnego-continued.xml",
                                          "spnego-continued-empty-leg.xml"));
+
+TEST(Negotiation, GoesOnOnlyWithItsCookie) {
+  Desk desk(std::make_shared<DevSts::ToyMechanism>(Legs(2), DevSts::Directory::MakeSample(),
+                                                   DevSts::MakeSystemClock(0)),
+            true);
+  for (const std::string kind : {"right", "among others", "none", "part", "another's"}) {
+    Client client(desk, Legs(2));
+    const DevSts::Answer first = desk.Send(client.Build(client.GetToy().Answer({})));
+    EXPECT_EQ(first.cookie.substr(0, 12), "negotiation=");
+    Quorlin::ResponseHandlerImpl().HandleSPNegoResponse(Pelmar::CreateStringReader(first.body).Get(),
+                                                        client.last);
+    const std::string cookie = kind == "right"          ? first.cookie
+                               : kind == "among others" ? "a=b; " + first.cookie + "; c=d"
+                               : kind == "none"         ? ""
+                               : kind == "part"         ? first.cookie.substr(0, first.cookie.size() - 1)
+                                                        : "negotiation=00000000-0000-4000-8000-000000000000";
+    const DevSts::Answer last = desk.Send(client.Build(client.GetToy().Answer(client.last.leg)), cookie);
+    EXPECT_EQ(FaultOf(last.body), kind == "right" || kind == "among others"
+                                      ? ""
+                                      : "wst:RequestFailed: The negotiation's cookie did not come back")
+        << kind;
+    EXPECT_EQ(last.cookie, "") << "it is given once";
+  }
+}
+
+TEST(Negotiation, GivesNoCookieUnlessToldTo) {
+  Desk desk(Legs(2));
+  Client client(desk, Legs(2));
+  EXPECT_EQ(desk.Send(client.Build(client.GetToy().Answer({}))).cookie, "");
+}
+
+/// The log's lines without their times.
+std::vector<std::string> Timeless(const std::vector<std::string>& lines) {
+  std::vector<std::string> result;
+  for (const std::string& line : lines) {
+    result.push_back(std::regex_replace(line, std::regex("\"time\":\"[^\"]*\""), "\"time\":0"));
+  }
+  return result;
+}
+
+TEST(Negotiation, LogsEachOfItsMessages) {
+  Desk desk(Legs(2));
+  EXPECT_EQ(Client(desk, Legs(2)).Run(), "challenge token ");
+  EXPECT_EQ(Client(desk, Legs(2), kAlice, "guess").Run(), "challenge " + std::string(kWrongProof) + " ");
+  const std::string first =
+      R"({"time":0,"operation":"issue","user":null,"asked":{"confirmation":"bearer","lifetimeSec":600,)"
+      R"("renewable":false,"delegable":false,"delegates":false,"audiences":0,"advices":0},"passed":["timestamp"],)"
+      R"("status":200,"answer":"challenge"})";
+  const std::vector<std::string> expected = {
+      first,
+      R"({"time":0,"operation":"challenge","user":"alice@example.com","asked":null,"passed":["timestamp","negotiation"],)"
+      R"("status":200,"answer":"token","granted":{"confirmation":"bearer","lifetimeSec":600}})",
+      first,
+      R"({"time":0,"operation":"challenge","user":null,"asked":null,"passed":["timestamp"],"status":500,)"
+      R"("answer":"fault","fault":"wst:FailedAuthentication","reason":"Invalid user name or password"})"};
+  EXPECT_EQ(Timeless(desk.lines), expected);
+}
 
 // ---- The toy on its own ----
 

@@ -129,7 +129,10 @@ TEST(RequestHandler, LogsAGrantedRequestInOneLine) {
   Handler handler;
   handler.Handle(PasswordRequest());
   const std::vector<std::string> expected = {
-      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":"alice@example.com","passed":["timestamp","password"],"status":200})"};
+      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":"alice@example.com",)"
+      R"("asked":{"confirmation":"bearer","lifetimeSec":600,"renewable":false,"delegable":false,"delegates":false,)"
+      R"("audiences":0,"advices":0},"passed":["timestamp","password"],"status":200,"answer":"token",)"
+      R"("granted":{"confirmation":"bearer","lifetimeSec":600}})"};
   EXPECT_EQ(handler.lines, expected);
 }
 
@@ -137,7 +140,9 @@ TEST(RequestHandler, LogsARefusedRequestInOneLine) {
   Handler handler;
   handler.Handle(ReplaceOnce(PasswordRequest(), ">secret<", ">guess<"));
   const std::vector<std::string> expected = {
-      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":"alice@example.com","passed":["timestamp"],"status":500,)"
+      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":"alice@example.com",)"
+      R"("asked":{"confirmation":"bearer","lifetimeSec":600,"renewable":false,"delegable":false,"delegates":false,)"
+      R"("audiences":0,"advices":0},"passed":["timestamp"],"status":500,"answer":"fault",)"
       R"("fault":"wst:FailedAuthentication","reason":"Invalid user name or password"})"};
   EXPECT_EQ(handler.lines, expected);
 }
@@ -146,7 +151,9 @@ TEST(RequestHandler, KeepsUnknownUserNamesOutOfTheLog) {
   Handler handler;
   handler.Handle(ReplaceOnce(PasswordRequest(), ">alice@example.com<", ">my-password<"));
   const std::vector<std::string> expected = {
-      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":null,"passed":["timestamp"],"status":500,)"
+      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":null,)"
+      R"("asked":{"confirmation":"bearer","lifetimeSec":600,"renewable":false,"delegable":false,"delegates":false,)"
+      R"("audiences":0,"advices":0},"passed":["timestamp"],"status":500,"answer":"fault",)"
       R"("fault":"wst:FailedAuthentication","reason":"Invalid user name or password"})"};
   EXPECT_EQ(handler.lines, expected);
 }
@@ -280,6 +287,17 @@ const Defect kDefects[] = {
      "<wst:Participants><wst:Participant><wsa:EndpointReference><wsa:Address> </wsa:Address></wsa:EndpointReference>"
      "</wst:Participant></wst:Participants></wst:RequestSecurityToken>",
      kFailed, "The address of a participant must not be blank"},
+    {"UnknownParticipant", "</wst:RequestSecurityToken>",
+     "<wst:Participants><wst:Primary/></wst:Participants></wst:RequestSecurityToken>", kClient,
+     "Participants holds an unknown Primary"},
+    {"UnknownAdvice", "</wst:RequestSecurityToken>",
+     "<a:AdviceSet xmlns:a=\"" QUORLIN_VENDOR_URI_BASE
+     "/names/2009/12/std-ext/WS-Trust1.4/advice\"><a:Hint/></a:AdviceSet></wst:RequestSecurityToken>",
+     kClient, "AdviceSet holds an unknown Hint"},
+    {"EmptyAdvice", "</wst:RequestSecurityToken>",
+     "<a:AdviceSet xmlns:a=\"" QUORLIN_VENDOR_URI_BASE
+     "/names/2009/12/std-ext/WS-Trust1.4/advice\"><a:Advice AdviceSource=\"x\"/></a:AdviceSet></wst:RequestSecurityToken>",
+     kFailed, "An advice must hold an attribute"},
     {"UnknownDelegate", "</wst:RequestSecurityToken>",
      "<wst:DelegateTo><wsse:UsernameToken><wsse:Username>carol@example.com</wsse:Username></wsse:UsernameToken>"
      "</wst:DelegateTo></wst:RequestSecurityToken>",
@@ -417,7 +435,7 @@ TEST(RequestHandler, ShowsNothingOfItsInsideWhenItFails) {
   EXPECT_EQ(answer.status, 500);
   EXPECT_EQ(answer.body, FaultEnvelope("soapenv:Server", "The service failed"));
   const std::vector<std::string> expected = {
-      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":null,"passed":[],"status":500,)"
+      R"({"time":"2030-01-01T00:00:01Z","operation":"issue","user":null,"asked":null,"passed":[],"status":500,"answer":"fault",)"
       R"("fault":"soapenv:Server","reason":"the clock on the left wall stands still"})"};
   EXPECT_EQ(lines, expected);
 }

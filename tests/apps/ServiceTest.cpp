@@ -37,6 +37,13 @@ int PortOf(const DevSts::Service& service) {
   return std::stoi(std::regex_replace(service.GetUrl(), std::regex(".*:([0-9]+)/sts"), "$1"));
 }
 
+DevSts::HttpResponse MakeText(const std::string& text) {
+  DevSts::HttpResponse response;
+  response.contentType = "text/plain";
+  response.body = text;
+  return response;
+}
+
 /// A server without TLS that answers with this handler.
 class PlainServer final {
  public:
@@ -71,7 +78,7 @@ TEST(HttpServer, HandsOverWhatTheHandlerNeeds) {
   DevSts::HttpRequest seen;
   const PlainServer server([&](const DevSts::HttpRequest& request) {
     seen = request;
-    return DevSts::HttpResponse{200, "text/plain", "hello", ""};
+    return MakeText("hello");
   });
   const Pelmar::Ref<Pelmar::Http::ClientRequest> request = MakePost("/path?query", "body");
   request->SetHeader("Content-Type", "text/xml");
@@ -88,7 +95,7 @@ TEST(HttpServer, RefusesBodiesBeyondItsLimitBeforeTheHandlerSeesThem) {
   std::atomic<int> calls{0};
   const PlainServer server([&](const DevSts::HttpRequest&) {
     ++calls;
-    return DevSts::HttpResponse{200, "text/plain", "taken", ""};
+    return MakeText("taken");
   });
   EXPECT_EQ(server.Send(MakePost("/", std::string(DevSts::kMaxRequestBytes, 'x'))), "200 OK|taken");
   EXPECT_EQ(calls, 1);
@@ -104,9 +111,7 @@ TEST(HttpServer, SurvivesAHandlerThatThrows) {
 }
 
 TEST(HttpServer, ServesSeveralRequestsOnOneConnection) {
-  const PlainServer server([](const DevSts::HttpRequest& request) {
-    return DevSts::HttpResponse{200, "text/plain", request.target, ""};
-  });
+  const PlainServer server([](const DevSts::HttpRequest& request) { return MakeText(request.target); });
   const Pelmar::Ref<Pelmar::Http::UserAgent> agent = MakeAgent(server.GetPort());
   for (const char* const path : {"/one", "/two", "/three"}) {
     EXPECT_EQ(Call(*agent, MakeGet(path)), std::string("200 OK|") + path);
@@ -121,7 +126,7 @@ TEST(HttpServer, WaitsForRunningHandlersWhenItEnds) {
     entered.set_value();
     mayLeave.get_future().wait();
     hasLeft = true;
-    return DevSts::HttpResponse{200, "text/plain", "", ""};
+    return MakeText("");
   });
   std::thread client([&, port = server->GetPort()] { Call(*MakeAgent(port), MakeGet("/")); });
   entered.get_future().wait();
@@ -135,9 +140,7 @@ TEST(HttpServer, WaitsForRunningHandlersWhenItEnds) {
 }
 
 TEST(HttpServer, EndsWhileAClientKeepsItsConnection) {
-  auto server = std::make_unique<PlainServer>([](const DevSts::HttpRequest&) {
-    return DevSts::HttpResponse{200, "text/plain", "hello", ""};
-  });
+  auto server = std::make_unique<PlainServer>([](const DevSts::HttpRequest&) { return MakeText("hello"); });
   const Pelmar::Ref<Pelmar::Http::UserAgent> agent = MakeAgent(server->GetPort());
   EXPECT_EQ(Call(*agent, MakeGet("/")), "200 OK|hello");
   server.reset();
