@@ -9,6 +9,8 @@
 #include <stdexcept>
 #include <string>
 
+#include <sys/resource.h>
+
 namespace Bench {
 
 namespace {
@@ -41,6 +43,15 @@ std::size_t GetPeakResidentKib() {
 
 void ForgetPeak() {
   std::ofstream("/proc/self/clear_refs") << "5";
+}
+
+double GetProcessorSeconds() {
+  rusage usage = {};
+  getrusage(RUSAGE_SELF, &usage);
+  const auto toSeconds = [](const timeval& time) {
+    return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_usec) / 1e6;
+  };
+  return toSeconds(usage.ru_utime) + toSeconds(usage.ru_stime);
 }
 
 std::size_t CountDescriptors() {

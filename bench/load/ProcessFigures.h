@@ -15,6 +15,8 @@ std::size_t GetResidentKib();
 /// The most memory in use since the start or the last ForgetPeak, in KiB.
 std::size_t GetPeakResidentKib();
 void ForgetPeak();
+/// The processor time of all threads so far, in seconds.
+double GetProcessorSeconds();
 std::size_t CountDescriptors();
 std::size_t CountThreads();
 

@@ -73,6 +73,7 @@ void KillService(pid_t service) {
 
 /// The helper's life: obeys until its parent has gone.
 [[noreturn]] void Help(int channel, const DevSts::Identity& server, const DevSts::Identity& signer) {
+  prctl(PR_SET_PDEATHSIG, SIGKILL);
   pid_t service = -1;
   Order order = {};
   while (ReceiveAll(channel, &order, sizeof(order))) {
@@ -119,8 +120,10 @@ ServiceProcess::ServiceProcess()
 }
 
 ServiceProcess::~ServiceProcess() {
-  close(_channel);
+  // Not by the end of the channel: another child of this process may hold its other end, too.
+  kill(_helper, SIGKILL);
   waitpid(_helper, nullptr, 0);
+  close(_channel);
 }
 
 void ServiceProcess::Start(unsigned delayMs) {
