@@ -7,6 +7,7 @@
 #include "quorlin/Kerberos.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
+#include "quorlin/Progress.h"
 
 #include <pelmar/http/Url.h>
 #include <quorlin/SecurityTokenService.h>
@@ -37,7 +38,10 @@ boost::shared_ptr<const Quorlin::SamlToken> AcquireByGss(const GssArguments& arg
   RequireKerberos();
   const boost::shared_ptr<Quorlin::SecurityTokenService> service =
       Quorlin::CreateSecurityTokenService(MakeServiceConfig(arguments.service, arguments.holderOfKey));
-  return AcquireByKerberos(*service, MakeTokenSpec(arguments.token), MakeKerberosOptions(arguments));
+  const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
+  const KerberosOptions kerberos = MakeKerberosOptions(arguments);
+  const Progress progress;
+  return AcquireByKerberos(*service, spec, kerberos);
 }
 
 void AddKerberosOptions(CLI::App& command, KerberosOptions& options) {
