@@ -269,7 +269,8 @@ const Misuse kMisuses[] = {
      "quorlin: cannot read /nonexistent/sts.pem: No such file or directory (UsageException)\n"},
     {"CertificateFileWithoutCertificate",
      {"--url", "https://x", "--user", "a", "--sts-cert", "/dev/null", "--password-stdin"},
-     "quorlin: cannot use the certificates in /dev/null: The PEM text holds no certificate (UsageException)\n"},
+     "quorlin: cannot use the certificates in /dev/null: The PEM text holds no certificate (the file is empty) "
+     "(UsageException)\n"},
 };
 
 INSTANTIATE_TEST_SUITE_P(Table, CliAcquireRefuses, testing::ValuesIn(kMisuses),
