@@ -18,6 +18,13 @@
 #include <string>
 #include <vector>
 
+/// MIT Kerberos 1.20 loses the acceptor's name when a keytab has no key for it: 88 bytes, once, in
+/// gss_acquire_cred_from. Nothing of ours calls the function that makes it. Asked for by the leak sanitizer.
+extern "C" __attribute__((visibility("default"))) const char* __lsan_default_suppressions();
+extern "C" const char* __lsan_default_suppressions() {
+  return "leak:krb5_build_principal_alloc_va\n";
+}
+
 namespace {
 
 using namespace KerberosTests;
