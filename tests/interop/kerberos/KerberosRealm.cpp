@@ -157,8 +157,10 @@ void KerberosRealm::CreateDatabase() const {
 void KerberosRealm::StartKdc() {
   for (int start = 0;; ++start) {
     Configure(FindFreePort());
-    _kdc = std::make_unique<StsTests::ChildProcess>(std::vector<std::string>{"/usr/bin/env", "krb5kdc", "-n"},
-                                                    StsTests::ChildProcess::Terminal::NONE);
+    // It ends with the test even when that crashes.
+    _kdc = std::make_unique<StsTests::ChildProcess>(
+        std::vector<std::string>{"/usr/bin/setpriv", "--pdeathsig", "KILL", "krb5kdc", "-n"},
+        StsTests::ChildProcess::Terminal::NONE);
     try {
       _kdc->ReadUntil("commencing operation");
       break;
