@@ -7,6 +7,7 @@
 
 #include <pelmar/http/HttpException.h>
 #include <pelmar/xml/Parser.h>
+#include <pelmar/xml/security/Exceptions.h>
 #include <quorlin/Exceptions.h>
 
 #include <cxxabi.h>
@@ -64,6 +65,10 @@ std::string GetAdvice(const std::exception& e) {
   if (Is<Quorlin::InvalidSignatureException>(e)) {
     return "The token must be signed with a certificate that --sts-cert or --trust names, or that chains to one of them, "
            "and must not have been changed on its way.";
+  }
+  if (Is<Pelmar::Xml::Security::XmlSecurityException>(e) &&
+      std::string(e.what()).rfind("Signature method ", 0) == 0) {
+    return "Requests are signed with RSA and SHA-256: the key of --key has to be an RSA key.";
   }
   if (Is<Pelmar::Xml::XMLParseException>(e)) {
     return "That is not the XML of a token, which is one document in UTF-8.";

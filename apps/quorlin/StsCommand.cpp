@@ -208,13 +208,13 @@ Command AddStsCommand(CLI::App& app) {
       ->add_option("--max-lifetime", config.handler.lifetime.maxSec,
                    "Cut longer token lifetimes down to this")
       ->type_name("SEC")
-      ->check(CLI::Range(1LL, 100LL * 365 * 24 * 60 * 60))
+      ->check(CLI::Range(1LL, 100LL * 365 * 24 * 60 * 60).description(""))
       ->capture_default_str();
   command
       ->add_option("--clock-offset", config.clockOffsetSec,
                    "Let the service's clock be ahead (negative: behind)")
       ->type_name("SEC")
-      ->check(CLI::Range(-100LL * 365 * 24 * 60 * 60, 100LL * 365 * 24 * 60 * 60));
+      ->check(CLI::Range(-100LL * 365 * 24 * 60 * 60, 100LL * 365 * 24 * 60 * 60).description(""));
   command
       ->add_option(
           "--toy-negotiation", arguments->toyLegs,

@@ -82,7 +82,7 @@ Command AddVerifyCommand(CLI::App& app) {
       ->add_option("--clock-tolerance", arguments->clockToleranceSec,
                    "Accept tokens that start this many seconds later or ended this many ago")
       ->type_name("SEC")
-      ->check(CLI::Range(0LL, kMaxClockToleranceSec))
+      ->check(CLI::Range(0LL, kMaxClockToleranceSec).description(""))
       ->capture_default_str();
   command->add_flag("--embedded", arguments->embedded,
                     "The file is a larger document (a SOAP answer, say); take its first SAML assertion");

@@ -140,6 +140,25 @@ TEST(CliKey, TakesAnEncryptedKey) {
   EXPECT_EQ(without.standardError.substr(0, expected.size()), expected);
 }
 
+// Requests are always signed with rsa-sha256.
+TEST(CliKey, SaysThatItHasToBeAnRsaKey) {
+  const Robot& robot = Robot::Get();
+  const std::string key = robot.GetPath("ec-key.pem");
+  ASSERT_EQ(TestSupport::RunProcess({"openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt",
+                                     "ec_paramgen_curve:P-256", "-nodes", "-subj", "/CN=robot", "-days", "1",
+                                     "-keyout", key, "-out", robot.GetPath("ec-cert.pem")})
+                .exitCode,
+            0);
+  const ProcessResult result =
+      robot.Run({"acquire", "certificate", "--cert", robot.GetPath("ec-cert.pem"), "--key", key});
+  EXPECT_EQ(result.exitCode, 4);
+  EXPECT_EQ(
+      result.standardError,
+      "quorlin: Signature method 'http://www.w3.org/2001/04/xmldsig-more#rsa-sha256' does not fit the key "
+      "(XmlSecurityException)\n"
+      "Requests are signed with RSA and SHA-256: the key of --key has to be an RSA key.\n");
+}
+
 TEST(CliKey, WantsTheKeyWithTheCertificate) {
   const Robot& robot = Robot::Get();
   const ProcessResult result = robot.Run({"acquire", "certificate", "--cert", robot.GetPath("cert.pem")});
