@@ -294,6 +294,33 @@ TEST(HttpClient, TakesStatusReasonAndBody) {
   }
 }
 
+/// "name=value" for each of the names that the answer has; "name" for each that it lacks.
+std::string CallForHeaders(const std::string& answer, const std::vector<std::string>& names) {
+  LoopbackServer server({AnswerAndClose(answer)});
+  const Ref<UserAgent> agent = MakeAgent(server.GetPort());
+  Ref<PendingRequestItem> item;
+  agent->SendAsync(
+      MakeGet("/"), [](const Pelmar::Exception*, ClientResponse*, PendingRequestItem*) {}, item);
+  Ref<ClientResponse> response;
+  agent->WaitFor(item, kPatience, response);
+  std::string text;
+  for (const std::string& name : names) {
+    std::string value = "unchanged";
+    text += name + (response->GetHeader(name, value) ? "=" : " not there, value ") + value + "\n";
+  }
+  return text;
+}
+
+TEST(HttpClient, GivesTheHeadersOfTheFinalResponse) {
+  EXPECT_EQ(
+      "date=today\nX-A=1, 2\nx-empty=\nX-Interim not there, value unchanged\nX-Trailer not there, value "
+      "unchanged\n",
+      CallForHeaders("HTTP/1.1 103 Early Hints\r\nX-Interim: 1\r\nX-A: 0\r\n\r\n"
+                     "HTTP/1.1 200 OK\r\nDate:  today \r\nX-A: 1\r\nx-a: 2\r\nX-Empty:\r\n"
+                     "Transfer-Encoding: chunked\r\n\r\n0\r\nX-Trailer: 1\r\n\r\n",
+                     {"date", "X-A", "x-empty", "X-Interim", "X-Trailer"}));
+}
+
 TEST(HttpClient, PassesOverInterimResponses) {
   EXPECT_EQ("200 OK|hello", CallOnce(AnswerAndClose("HTTP/1.1 100 Continue\r\n\r\n" + kHello)));
   EXPECT_EQ("200 OK|hello",

@@ -54,6 +54,7 @@ class FakeResponse final : public Pelmar::Http::ClientResponse {
   FakeResponse(int status, const std::string& reason) : _status(status), _reason(reason) {}
   int GetStatusCode() const override { return _status; }
   const std::string& GetReason() const override { return _reason; }
+  bool GetHeader(const std::string&, std::string&) const override { return false; }
   std::size_t Read(char*, std::size_t) override { throw Pelmar::InvalidStateException("the body was read"); }
 
  private:

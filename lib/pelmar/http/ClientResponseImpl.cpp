@@ -3,6 +3,8 @@
 
 #include "pelmar/http/ClientResponseImpl.h"
 
+#include <pelmar/StringUtil.h>
+
 #include <utility>
 
 namespace Pelmar {
@@ -10,8 +12,12 @@ namespace Http {
 
 ClientResponse::~ClientResponse() = default;
 
-ClientResponseImpl::ClientResponseImpl(int statusCode, std::string reason, std::string body)
-    : _statusCode(statusCode), _reason(std::move(reason)), _body(std::move(body)) {}
+ClientResponseImpl::ClientResponseImpl(int statusCode, std::string reason, ResponseHeaders headers,
+                                       std::string body)
+    : _statusCode(statusCode),
+      _reason(std::move(reason)),
+      _headers(std::move(headers)),
+      _body(std::move(body)) {}
 
 ClientResponseImpl::~ClientResponseImpl() = default;
 
@@ -27,6 +33,18 @@ int ClientResponseImpl::GetStatusCode() const {
 
 const std::string& ClientResponseImpl::GetReason() const {
   return _reason;
+}
+
+bool ClientResponseImpl::GetHeader(const std::string& name, std::string& value) const {
+  const std::string wanted = StringUtil::ToLower(name);
+  bool isFound = false;
+  for (const auto& header : _headers) {
+    if (StringUtil::ToLower(header.first) == wanted) {
+      value = isFound ? value + ", " + header.second : header.second;
+      isFound = true;
+    }
+  }
+  return isFound;
 }
 
 }  // namespace Http

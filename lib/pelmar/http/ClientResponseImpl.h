@@ -10,23 +10,30 @@
 
 #include <cstddef>
 #include <string>
+#include <utility>
+#include <vector>
 
 namespace Pelmar {
 namespace Http {
 
+/// Names and values in the order in which they came.
+using ResponseHeaders = std::vector<std::pair<std::string, std::string>>;
+
 class ClientResponseImpl final : public ClientResponse {
  public:
-  ClientResponseImpl(int statusCode, std::string reason, std::string body);
+  ClientResponseImpl(int statusCode, std::string reason, ResponseHeaders headers, std::string body);
 
   std::size_t Read(char* buffer, std::size_t size) override;
   int GetStatusCode() const override;
   const std::string& GetReason() const override;
+  bool GetHeader(const std::string& name, std::string& value) const override;
 
  private:
   ~ClientResponseImpl() override;
 
   const int _statusCode;
   const std::string _reason;
+  const ResponseHeaders _headers;
   const std::string _body;
   std::size_t _position = 0;
 };

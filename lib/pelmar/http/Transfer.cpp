@@ -34,6 +34,25 @@ void Append(TextList& list, const std::string& line) {
   list.reset(longer);
 }
 
+/// The engine leaves part of the line's end in a value that is empty.
+std::string TrimBlanks(const std::string& text) {
+  const char* const blanks = " \t\r\n";
+  const std::size_t start = text.find_first_not_of(blanks);
+  return start == std::string::npos ? std::string()
+                                    : text.substr(start, text.find_last_not_of(blanks) + 1 - start);
+}
+
+/// Those of the final response. There are no more bytes of them than were let through as they arrived.
+ResponseHeaders CollectHeaders(CURL* easy) {
+  constexpr int kLastResponse = -1;
+  ResponseHeaders headers;
+  curl_header* header = nullptr;
+  while ((header = curl_easy_nextheader(easy, CURLH_HEADER, kLastResponse, header)) != nullptr) {
+    headers.emplace_back(header->name, TrimBlanks(header->value));
+  }
+  return headers;
+}
+
 bool HasHeader(const RequestParts& request, const std::string& lowerName) {
   return std::any_of(request.headers.begin(), request.headers.end(),
                      [&](const auto& header) { return StringUtil::ToLower(header.first) == lowerName; });
@@ -208,8 +227,8 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
 void Transfer::Finish(CURLcode code) {
   SaveCookies();
   if (HasSucceeded(code)) {
-    _exchange->Settle(
-        nullptr, MakeRef<ClientResponseImpl>(_head.GetStatusCode(), _head.GetReason(), std::move(_body)));
+    _exchange->Settle(nullptr, MakeRef<ClientResponseImpl>(_head.GetStatusCode(), _head.GetReason(),
+                                                           CollectHeaders(_easy.get()), std::move(_body)));
   } else {
     _exchange->Settle(DescribeFailure(code), nullptr);
   }

@@ -95,6 +95,10 @@ class PELMAR_API ClientResponse : public Reader {
   virtual int GetStatusCode() const = 0;
   /// The reason phrase of the status line, with "?" for control characters; empty when there is none.
   virtual const std::string& GetReason() const = 0;
+  /// Looks a header of the response up, `name` in any letter case. True and the value when there is one;
+  /// several of the same name are one list, joined by ", " (RFC 9110, section 5.3). Else false and `value`
+  /// unchanged. Headers of interim responses and trailers do not count.
+  virtual bool GetHeader(const std::string& name, std::string& value) const = 0;
 
  protected:
   ~ClientResponse() override;
