@@ -22,6 +22,9 @@ Clock MakeSystemClock(long long offsetSec);
 /// An instant as xs:dateTime with "Z".
 std::string ToDateText(long long utcMicroseconds);
 
+/// An instant as the HTTP header Date has it (RFC 9110, section 5.6.7): "Sun, 06 Nov 1994 08:49:37 GMT".
+std::string ToHttpDate(long long utcMicroseconds);
+
 }  // namespace DevSts
 
 #endif  // QUORLIN_DEVSTS_CLOCK_H

@@ -64,6 +64,9 @@ http::response<http::string_body> ToMessage(HttpResponse response,
                                             const http::request<http::string_body>& request) {
   http::response<http::string_body> message(static_cast<http::status>(response.status), request.version());
   message.set(http::field::content_type, response.contentType);
+  if (!response.date.empty()) {
+    message.set(http::field::date, response.date);
+  }
   if (!response.allow.empty()) {
     message.set(http::field::allow, response.allow);
   }

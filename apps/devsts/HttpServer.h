@@ -33,6 +33,7 @@ struct HttpResponse {
   std::string body;
   std::string allow;                   ///< For the Allow header; empty: none.
   std::string setCookie;               ///< For the Set-Cookie header; empty: none.
+  std::string date;                    ///< For the Date header; empty: none.
   std::chrono::milliseconds delay{0};  ///< How long to hold the answer back. Keeps no thread busy.
   bool isDropped = false;              ///< Instead of an answer the connection is closed.
 };

@@ -81,8 +81,10 @@ Service::Service(const ServiceConfig& config)
     _serverCertificate = options.tls->certificate;
   }
   _server = std::make_unique<HttpServer>(
-      options, [this, tls = config.tls, delay = config.delay](const HttpRequest& request) {
+      options, [this, tls = config.tls, delay = config.delay,
+                clock = MakeSystemClock(config.clockOffsetSec)](const HttpRequest& request) {
         HttpResponse response = Respond(_handler, request, tls);
+        response.date = ToHttpDate(clock());
         response.delay = delay;
         return response;
       });
