@@ -31,6 +31,8 @@ Command AddRenewCommand(CLI::App& app);
 Command AddValidateCommand(CLI::App& app);
 /// verify
 Command AddVerifyCommand(CLI::App& app);
+/// inspect
+Command AddInspectCommand(CLI::App& app);
 /// request password, request certificate, request exchange, request renew, request validate, request spnego
 std::vector<Command> AddRequestCommands(CLI::App& app);
 /// sts

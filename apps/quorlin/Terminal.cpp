@@ -86,6 +86,17 @@ std::string MakePrintable(const std::string& text) {
   return result;
 }
 
+std::string CutText(const std::string& text, std::size_t maxBytes) {
+  if (text.size() <= maxBytes) {
+    return text;
+  }
+  std::size_t end = maxBytes;
+  while (end > 0 && IsContinuation(text, end)) {
+    --end;
+  }
+  return text.substr(0, end) + "...";
+}
+
 std::string DescribeSpan(long long microseconds) {
   const long long seconds = microseconds / 1000000;
   const std::array<long long, 4> counts = {seconds / 86400, seconds / 3600 % 24, seconds / 60 % 60,

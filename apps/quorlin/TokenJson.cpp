@@ -128,4 +128,8 @@ std::string ToText(const Json& json) {
   return json.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
+std::string ToAsciiText(const Json& json) {
+  return json.dump(-1, ' ', true, Json::error_handler_t::replace);
+}
+
 }  // namespace Cli

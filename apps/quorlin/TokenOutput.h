@@ -29,6 +29,10 @@ Json DescribeFailure(const Failure& failure);
 /// One line of UTF-8; bytes that are none are replaced.
 std::string ToText(const Json& json);
 
+/// The same with everything beyond printable ASCII escaped: for texts of anybody, which could steer a
+/// terminal.
+std::string ToAsciiText(const Json& json);
+
 /// Some lines for people, each ending in a line feed. `now` tells how long the token is still valid.
 std::string SummarizeToken(const Quorlin::SamlToken& token, const Pelmar::System::DateTime& now);
 

@@ -51,6 +51,7 @@ std::vector<Cli::Command> AddCommands(CLI::App& app) {
   commands.push_back(Cli::AddRenewCommand(app));
   commands.push_back(Cli::AddValidateCommand(app));
   commands.push_back(Cli::AddVerifyCommand(app));
+  commands.push_back(Cli::AddInspectCommand(app));
   for (const Cli::Command& command : Cli::AddRequestCommands(app)) {
     commands.push_back(command);
   }
