@@ -33,6 +33,8 @@ Command AddValidateCommand(CLI::App& app);
 Command AddVerifyCommand(CLI::App& app);
 /// inspect
 Command AddInspectCommand(CLI::App& app);
+/// doctor
+Command AddDoctorCommand(CLI::App& app);
 /// request password, request certificate, request exchange, request renew, request validate, request spnego
 std::vector<Command> AddRequestCommands(CLI::App& app);
 /// sts

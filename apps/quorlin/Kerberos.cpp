@@ -42,6 +42,13 @@ boost::shared_ptr<const Quorlin::SamlToken> AcquireByKerberos(const Quorlin::Sec
   return token;
 }
 
+void GetKerberosTicket(const std::string& target) {
+  Quorlin::GssapiOptions options;
+  options.targetService = target;
+  // The first leg cannot be made without the ticket.
+  Quorlin::CreateGssapiNegotiationHandler(options)->Negotiate(Quorlin::Leg());
+}
+
 std::shared_ptr<const DevSts::NegotiationMechanism> MakeKerberosMechanism(const std::string& keytab,
                                                                           const std::string& service) {
   try {

@@ -35,6 +35,10 @@ boost::shared_ptr<const Quorlin::SamlToken> AcquireByKerberos(const Quorlin::Sec
                                                               const Quorlin::TokenSpec& spec,
                                                               const KerberosOptions& options);
 
+/// Gets a Kerberos ticket for `target` (SERVICE@HOST), of the default credential cache. Nothing is sent to
+/// the target itself. Throws what the negotiation handler throws.
+void GetKerberosTicket(const std::string& target);
+
 /// Lets the development token service accept tickets for the keys in the file `keytab`; for that of `service`
 /// (SERVICE@HOST) alone unless it is empty. Throws UsageException.
 std::shared_ptr<const DevSts::NegotiationMechanism> MakeKerberosMechanism(const std::string& keytab,

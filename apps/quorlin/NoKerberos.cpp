@@ -26,6 +26,10 @@ boost::shared_ptr<const Quorlin::SamlToken> AcquireByKerberos(const Quorlin::Sec
   Refuse();
 }
 
+void GetKerberosTicket(const std::string&) {
+  Refuse();
+}
+
 std::shared_ptr<const DevSts::NegotiationMechanism> MakeKerberosMechanism(const std::string&,
                                                                           const std::string&) {
   Refuse();

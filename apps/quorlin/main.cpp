@@ -52,6 +52,7 @@ std::vector<Cli::Command> AddCommands(CLI::App& app) {
   commands.push_back(Cli::AddValidateCommand(app));
   commands.push_back(Cli::AddVerifyCommand(app));
   commands.push_back(Cli::AddInspectCommand(app));
+  commands.push_back(Cli::AddDoctorCommand(app));
   for (const Cli::Command& command : Cli::AddRequestCommands(app)) {
     commands.push_back(command);
   }
