@@ -7,9 +7,9 @@
 #include "quorlin/Files.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
+#include "quorlin/XmlFile.h"
 #include "quorlin/explain/ElementTrail.h"
 #include "quorlin/explain/Explanation.h"
-#include "quorlin/xmlReading.h"
 
 #include <pelmar/xml/Parser.h>
 #include <quorlin/SamlToken.h>
@@ -39,8 +39,7 @@ std::string ReadDocument(const VerifyArguments& arguments) {
 
 boost::shared_ptr<const Quorlin::SamlToken> VerifyEmbedded(const std::string& xml, const Trust& trust,
                                                            long long clockToleranceSec) {
-  Pelmar::Ref<Pelmar::Xml::Document> document;
-  Quorlin::ParseXML(xml, document);
+  const Pelmar::Ref<Pelmar::Xml::Document> document = ParseXml(xml);
   Pelmar::Xml::ElementNode* const assertion = FindAssertion(document->GetDocumentElement());
   if (assertion == nullptr) {
     throw Quorlin::ParseException("Expected element 'Assertion' not found.");

@@ -3,6 +3,8 @@
 
 #include "quorlin/explain/ElementTrail.h"
 
+#include "quorlin/XmlFile.h"
+
 #include <cstddef>
 
 namespace Cli {
@@ -61,17 +63,8 @@ Place FindPlace(const ElementNode* element, const ElementNode* root) {
 }
 
 ElementNode* FindAssertion(ElementNode* element) {
-  if (Quorlin::ElementQNameIs(element, "Assertion", kSamlNs)) {
-    return element;
-  }
-  for (Node* child = element->GetFirstChildNode(); child != nullptr; child = child->GetNextSibling()) {
-    ElementNode* const childElement = AsElement(child);
-    ElementNode* const found = childElement == nullptr ? nullptr : FindAssertion(childElement);
-    if (found != nullptr) {
-      return found;
-    }
-  }
-  return nullptr;
+  // The tree is the caller's own, so it may be handed out as it came.
+  return const_cast<ElementNode*>(FindElement(*element, kSamlNs, "Assertion"));
 }
 
 }  // namespace Cli

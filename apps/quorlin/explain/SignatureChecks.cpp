@@ -3,6 +3,7 @@
 
 #include "quorlin/explain/SignatureChecks.h"
 
+#include "quorlin/CertificateText.h"
 #include "quorlin/explain/ElementTrail.h"
 
 #include <pelmar/Exception.h>
@@ -85,20 +86,8 @@ class Witness final : public Security::KeyInfoResolver {
   mutable Ref<const Certificate> _signer;
 };
 
-Json DescribeCertificate(const Certificate& certificate) {
-  return {{"subject", certificate.GetSubject()},
-          {"issuer", certificate.GetIssuer()},
-          {"notBefore", certificate.GetNotBefore().ToString()},
-          {"notAfter", certificate.GetNotAfter().ToString()}};
-}
-
-std::string DescribeCertificateForPeople(const Certificate& certificate) {
-  return certificate.GetSubject() + ", issued by " + certificate.GetIssuer() + ", valid from " +
-         certificate.GetNotBefore().ToString() + " to " + certificate.GetNotAfter().ToString();
-}
-
 void AddCertificate(const char* role, const Certificate& certificate, const char* list, Check& check) {
-  check.details.push_back(std::string(role) + ": " + DescribeCertificateForPeople(certificate));
+  check.details.push_back(std::string(role) + ": " + PrintCertificate(certificate));
   check.data[list].push_back(DescribeCertificate(certificate));
 }
 
