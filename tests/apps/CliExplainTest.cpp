@@ -137,6 +137,25 @@ TEST(CliExplain, SaysWhereTheStructureEnds) {
   EXPECT_LT(0, check["place"]["line"].get<int>());
 }
 
+TEST(CliExplain, LeavesOutTheMiddleOfALongWay) {
+  std::string token = ReadAll(kVectors + "accept/plain.xml");
+  std::string statement = "<saml:AttributeStatement><saml:Attribute Name=\"many\">";
+  for (int i = 0; i < 3000; ++i) {
+    statement += "<saml:AttributeValue>v</saml:AttributeValue>";
+  }
+  statement += "</saml:Attribute></saml:AttributeStatement>";
+  token.insert(token.rfind("</saml:Assertion>"), statement);
+  const TestSupport::TemporaryDirectory directory;
+  const std::string path = directory.GetPath("long.xml");
+  std::ofstream(path, std::ios::binary) << token;
+  const Json json = ExplainVector(path);
+  const Json& data = json["checks"][1]["data"];
+  EXPECT_EQ(1000U, data["steps"].size());
+  EXPECT_LT(2000, data["stepsLeftOut"].get<int>());
+  EXPECT_EQ("/Assertion/AttributeStatement/Attribute/AttributeValue[3000]", data["steps"].back()["path"]);
+  EXPECT_EQ("failed", json["checks"][6]["state"]) << "the addition was not signed";
+}
+
 TEST(CliExplain, SaysWhereTheXmlEnds) {
   const TestSupport::TemporaryDirectory directory;
   const std::string path = directory.GetPath("broken.xml");
