@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
+#include "quorlin/CommandTree.h"
 #include "quorlin/Commands.h"
 #include "quorlin/ExitCode.h"
 #include "quorlin/Terminal.h"
@@ -34,6 +35,24 @@ std::string DescribeUnexpected(const std::vector<std::string>& arguments) {
             (isFlag ? argument.substr(0, argument.find('=')) : std::string("a value without a flag"));
   }
   return "not expected: " + text;
+}
+
+/// The command as far as it was understood: the last of the commands that stand one below the other.
+const CLI::App& FindParsed(const CLI::App& app) {
+  const CLI::App* parsed = &app;
+  while (!parsed->get_subcommands().empty()) {
+    parsed = parsed->get_subcommands().front();
+  }
+  return *parsed;
+}
+
+/// What could have stood where no command did. The word that did is not repeated: see above.
+std::string DescribeMissingCommand(const CLI::App& app) {
+  std::string names;
+  for (const Cli::CommandHelp& command : Cli::ReadCommandTree(FindParsed(app)).subcommands) {
+    names += (names.empty() ? "" : ", ") + command.name;
+  }
+  return "there has to be one of these commands: " + names;
 }
 
 int ReportUsage(const CLI::App& app, const std::string& what) {
@@ -75,7 +94,9 @@ int Run(int argumentCount, char** arguments) {
   } catch (const CLI::ExtrasError&) {
     return ReportUsage(app, DescribeUnexpected(app.remaining(true)));
   } catch (const CLI::ParseError& e) {
-    return ReportUsage(app, e.what());
+    const bool lacksCommand = e.get_exit_code() == static_cast<int>(CLI::ExitCodes::RequiredError) &&
+                              !Cli::ReadCommandTree(FindParsed(app)).subcommands.empty();
+    return ReportUsage(app, lacksCommand ? DescribeMissingCommand(app) : e.what());
   }
   for (const Cli::Command& command : commands) {
     if (command.app->parsed()) {

@@ -402,7 +402,10 @@ struct Refused {
 };
 
 const Refused kRefused[] = {
-    {"NoRequest", {}, 2, "quorlin: A subcommand is required\nTry quorlin request --help\n"},
+    {"NoRequest",
+     {},
+     2,
+     "quorlin: there has to be one of these commands: password, certificate, exchange, renew, validate, spnego\nTry quorlin request --help\n"},
     {"PasswordOnTheCommandLine", Join(kPassword, {"--password", "topsecret"}), 2,
      "quorlin: a password on the command line can be seen by every user of this machine, so it is not taken from "
      "there; use --password-file, --password-stdin or the prompt (and change that password)\n"

@@ -440,9 +440,15 @@ TEST(Cli, HelpsWithEveryCommand) {
 }
 
 TEST(Cli, WantsACommand) {
-  const ProcessResult result = RunCli({});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.standardError, "quorlin: A subcommand is required\nTry quorlin --help\n");
+  for (const std::vector<std::string>& arguments :
+       std::vector<std::vector<std::string>>{{}, {"verfy"}, {"acqire", "password"}}) {
+    const ProcessResult result = RunCli(arguments);
+    EXPECT_EQ(result.exitCode, 2);
+    EXPECT_EQ(
+        result.standardError,
+        "quorlin: there has to be one of these commands: acquire, renew, validate, verify, inspect, doctor, request, "
+        "sts, demo\nTry quorlin --help\n");
+  }
 }
 
 TEST(Cli, RefusesAnUnknownCommand) {
