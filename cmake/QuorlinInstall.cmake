@@ -54,7 +54,12 @@ endif()
 if(TARGET quorlin)
   install(TARGETS quorlin RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}" COMPONENT tools)
   set(help_dir "${PROJECT_BINARY_DIR}/help")
-  install(FILES "${help_dir}/quorlin.1" DESTINATION "${CMAKE_INSTALL_MANDIR}/man1" COMPONENT tools)
+  # Debian Policy, 12.1: the pages of packages are compressed.
+  if(QUORLIN_PACKAGE)
+    install(FILES "${help_dir}/quorlin.1.gz" DESTINATION "${CMAKE_INSTALL_MANDIR}/man1" COMPONENT tools)
+  else()
+    install(FILES "${help_dir}/quorlin.1" DESTINATION "${CMAKE_INSTALL_MANDIR}/man1" COMPONENT tools)
+  endif()
   install(FILES "${help_dir}/quorlin.bash" RENAME quorlin
     DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions" COMPONENT tools)
   # Where zsh looks depends on whether the system or the administrator installed a program.

@@ -20,6 +20,11 @@ set(CPACK_DEBIAN_ENABLE_COMPONENT_DEPENDS ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS "${PROJECT_BINARY_DIR}/lib")
 set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
+# Before 1.0 the libraries fit programs that were built with just this version.
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS ON)
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS_POLICY "=")
+# Debian Policy, 8.1.1: libraries tell ldconfig by a trigger.
+file(WRITE "${PROJECT_BINARY_DIR}/package/triggers" "activate-noawait ldconfig\n")
 
 # quorlin_package(<component> <package name> <section> <summary> <text>)
 macro(quorlin_package component name section summary text)
@@ -43,22 +48,20 @@ execute_process(COMMAND gzip -9 -n -c "${PROJECT_BINARY_DIR}/package/changelog"
 set(CPACK_COMPONENTS_ALL)
 quorlin_package(runtime "libquorlin${PROJECT_VERSION_MAJOR}" libs
   "Client library for WS-Trust token services"
-  "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens strictly.\nThese are the shared libraries.")
-set(CPACK_DEBIAN_RUNTIME_PACKAGE_GENERATE_SHLIBS ON)
-set(CPACK_DEBIAN_RUNTIME_PACKAGE_GENERATE_SHLIBS_POLICY "=")
+  "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens\nstrictly. These are the shared libraries.")
+set(CPACK_DEBIAN_RUNTIME_PACKAGE_CONTROL_EXTRA "${PROJECT_BINARY_DIR}/package/triggers")
 
 if(TARGET quorlin_gssapi_library)
   quorlin_package(gssapi "libquorlin-gssapi${PROJECT_VERSION_MAJOR}" libs
     "Kerberos for the client library for WS-Trust token services"
-    "Asks WS-Trust 1.3 token services for SAML 2.0 tokens by a Kerberos ticket.\nThis is the shared library.")
+    "Asks WS-Trust 1.3 token services for SAML 2.0 tokens by a Kerberos\nticket. This is the shared library.")
   set(CPACK_COMPONENT_GSSAPI_DEPENDS runtime)
-  set(CPACK_DEBIAN_GSSAPI_PACKAGE_GENERATE_SHLIBS ON)
-  set(CPACK_DEBIAN_GSSAPI_PACKAGE_GENERATE_SHLIBS_POLICY "=")
+  set(CPACK_DEBIAN_GSSAPI_PACKAGE_CONTROL_EXTRA "${PROJECT_BINARY_DIR}/package/triggers")
 endif()
 
 quorlin_package(development "libquorlin-dev" libdevel
   "Client library for WS-Trust token services (development files)"
-  "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens strictly.\nThese are the headers and what CMake and pkg-config need.")
+  "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens\nstrictly. These are the headers and what CMake and pkg-config need.")
 set(CPACK_COMPONENT_DEVELOPMENT_DEPENDS runtime)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "libboost-dev")
 if(TARGET quorlin_gssapi_library)
@@ -68,7 +71,7 @@ endif()
 if(TARGET quorlin)
   quorlin_package(tools "quorlin-tools" utils
     "Command-line tool for WS-Trust token services"
-    "Asks WS-Trust 1.3 token services for SAML 2.0 tokens, checks tokens, and runs a token\nservice for development.")
+    "Asks WS-Trust 1.3 token services for SAML 2.0 tokens, checks tokens, and\nruns a token service for development.")
   set(CPACK_COMPONENT_TOOLS_DEPENDS runtime)
 endif()
 
