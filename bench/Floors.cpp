@@ -92,13 +92,6 @@ Action TokeniseText(const std::string& text) {
   };
 }
 
-Action DecodeCertificate(const std::vector<unsigned char>& der) {
-  return [der] {
-    const unsigned char* position = der.data();
-    Check(Pelmar::Crypto::X509Handle(d2i_X509(nullptr, &position, static_cast<long>(der.size()))) != nullptr);
-  };
-}
-
 Action DoAll(const std::vector<Action>& actions) {
   return [actions] {
     for (const Action& action : actions) {

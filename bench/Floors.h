@@ -28,9 +28,6 @@ Action HashText(const std::string& text);
 /// A new expat parser, one pass over `text` with handlers that do nothing, and the end of the parser.
 Action TokeniseText(const std::string& text);
 
-/// OpenSSL's reading of a certificate (d2i_X509), key included.
-Action DecodeCertificate(const std::vector<unsigned char>& der);
-
 /// All of `actions`, one after the other.
 Action DoAll(const std::vector<Action>& actions);
 

@@ -136,7 +136,6 @@ int Run(const Options& options) {
   for (std::size_t i = 0; i < sections.size(); ++i) {
     PrintSection(sections[i], results[i]);
   }
-  std::printf("\n(*) The floor has one more step: OpenSSL decodes the holder's certificate.\n");
   bool within = PrintGrowth(sections.front(), results.front());
   PrintLoad(service);
   if (!options.check) {
