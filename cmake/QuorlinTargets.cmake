@@ -3,8 +3,15 @@
 #
 # How every target of ours is compiled and linked.
 
+include(CheckCXXCompilerFlag)
 include(CheckPIESupported)
 check_pie_supported(LANGUAGES CXX)
+
+# Control-flow protection is the processor's affair: x86 has it as CET, AArch64 as BTI and PAC. Where the compiler knows
+# neither, there is none.
+check_cxx_compiler_flag(-fcf-protection=full QUORLIN_HAS_CF_PROTECTION)
+check_cxx_compiler_flag(-mbranch-protection=standard QUORLIN_HAS_BRANCH_PROTECTION)
+check_cxx_compiler_flag(-fstack-clash-protection QUORLIN_HAS_STACK_CLASH_PROTECTION)
 
 # Warnings are our business alone: linked PRIVATE for the build, never exported.
 add_library(quorlin_warnings INTERFACE)
@@ -20,14 +27,18 @@ file(RELATIVE_PATH quorlin_sources_from_build "${PROJECT_BINARY_DIR}" "${PROJECT
 target_compile_options(quorlin_hardening INTERFACE
   -UNDEBUG
   -fstack-protector-strong
+  $<$<BOOL:${QUORLIN_HAS_STACK_CLASH_PROTECTION}>:-fstack-clash-protection>
+  $<$<BOOL:${QUORLIN_HAS_CF_PROTECTION}>:-fcf-protection=full>
+  $<$<BOOL:${QUORLIN_HAS_BRANCH_PROTECTION}>:-mbranch-protection=standard>
   "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/="
   "-fmacro-prefix-map=${quorlin_sources_from_build}=")
 target_compile_definitions(quorlin_hardening INTERFACE _GLIBCXX_ASSERTIONS)
-# _FORTIFY_SOURCE needs an optimised build, and hides accesses from the sanitizers.
+# _FORTIFY_SOURCE needs an optimised build, and hides accesses from the sanitizers. Level 3 also bounds objects whose size
+# is known at run time only; a C library that is too old for it takes it for level 2.
 if(NOT QUORLIN_SANITIZE)
   target_compile_options(quorlin_hardening INTERFACE
     $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-U_FORTIFY_SOURCE>
-    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-D_FORTIFY_SOURCE=2>)
+    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-D_FORTIFY_SOURCE=3>)
 endif()
 target_link_options(quorlin_hardening INTERFACE -Wl,-z,relro,-z,now)
 
