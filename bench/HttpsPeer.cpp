@@ -49,12 +49,17 @@ void Require(bool holds, const char* what) {
   }
 }
 
-TlsContext MakeContext(const TestSupport::Identity& identity) {
+TlsContext MakeContext(const TestSupport::Identity& identity, HttpsPeer::Resumption resumption) {
   TlsContext context(SSL_CTX_new(TLS_server_method()));
   const auto certificate = Pelmar::Crypto::ToCertificateImpl(identity.certificate.Get());
   Require(context && SSL_CTX_use_certificate(context.get(), certificate->GetX509()) == 1 &&
               SSL_CTX_use_PrivateKey(context.get(), identity.keyPair.GetHandle()) == 1,
           "the TLS server cannot be set up");
+  if (resumption == HttpsPeer::NEVER_RESUMES) {
+    SSL_CTX_set_session_cache_mode(context.get(), SSL_SESS_CACHE_OFF);
+    SSL_CTX_set_num_tickets(context.get(), 0);
+    SSL_CTX_set_options(context.get(), SSL_OP_NO_TICKET);
+  }
   return context;
 }
 
@@ -125,8 +130,11 @@ void ServeConnection(SSL_CTX* context, int number, const std::string& answer) {
 
 }  // namespace
 
-HttpsPeer::HttpsPeer(const TestSupport::Identity& identity, const std::string& answer) {
-  const TlsContext context = MakeContext(identity);
+HttpsPeer::HttpsPeer(const TestSupport::Identity& identity, const std::string& body, Resumption resumption) {
+  const std::string answer =
+      "HTTP/1.1 200 OK\r\nContent-Type: text/xml\r\nContent-Length: " + std::to_string(body.size()) +
+      "\r\n\r\n" + body;
+  const TlsContext context = MakeContext(identity, resumption);
   const Socket listener(Listen(_port));
   _process = fork();
   Require(_process >= 0, "the TLS server cannot be started");

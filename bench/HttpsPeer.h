@@ -15,11 +15,13 @@
 namespace Bench {
 
 /// Serves HTTPS on a port of 127.0.0.1 from construction to destruction: every request, whatever it asks for,
-/// is answered with the same bytes. Construct it before there is a second thread, for it forks.
+/// is answered with status 200 and the same body. Construct it before there is a second thread, for it forks.
 class HttpsPeer final {
  public:
+  enum Resumption { RESUMES, NEVER_RESUMES };
+
   /// Throws std::runtime_error.
-  HttpsPeer(const TestSupport::Identity& identity, const std::string& answer);
+  HttpsPeer(const TestSupport::Identity& identity, const std::string& body, Resumption resumption);
   HttpsPeer(const HttpsPeer&) = delete;
   HttpsPeer& operator=(const HttpsPeer&) = delete;
   ~HttpsPeer();

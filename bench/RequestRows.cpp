@@ -24,7 +24,7 @@ using Quorlin::TokenSpec;
 
 namespace {
 
-constexpr double kSignedAim = 1.15;
+constexpr double kSignedAim = 1.08;
 constexpr double kSignedLimit = 2;
 constexpr double kUnsignedAimMicroseconds = 40;
 constexpr double kUnsignedLimit = 4;

@@ -7,6 +7,7 @@
 #define QUORLIN_BENCH_ROWS_H
 
 #include "bench/Measure.h"
+#include "bench/PeerSet.h"
 
 #include <string>
 #include <vector>
@@ -19,8 +20,8 @@ struct Section {
   std::vector<Row> rows;
 };
 
-/// The first three rows are the small, the medium and the large token.
-Section MakeValidationSection();
+/// The first four rows are the small, the medium, the large and the huge token.
+Section MakeValidationSection(const PeerSet& peers);
 /// The same tokens through the single steps of validation.
 Section MakeStepsSection();
 Section MakeSignedRequestsSection();

@@ -19,6 +19,22 @@ std::vector<std::string> MakeGroups(std::size_t count) {
   return groups;
 }
 
+SampleToken MakeDirect(const std::string& name, std::size_t groups) {
+  return {name, SignToken(ComposeBearerToken(groups)), Trust({TokenSigner()}), groups};
+}
+
+SampleToken MakeIssuedSample() {
+  const Identity root = MakeCa("Benchmark root", 1);
+  CertificateSpec spec;
+  spec.keyNumber = 2;
+  const Identity signer = MakeIssued(root, spec);
+  TokenSigning signing;
+  signing.alsoShown = {root};
+  return {"5 groups, signer below a trusted root",
+          SignToken(ComposeBearerToken(kSmallTokenGroups).Compose(), signer, signing), Trust({root}),
+          kSmallTokenGroups};
+}
+
 }  // namespace
 
 TokenText ComposeBearerToken(std::size_t groups) {
@@ -38,6 +54,14 @@ TokenText ComposeHolderOfKeyToken(std::size_t groups, const Identity& holder) {
   TokenText text = ComposeBearerToken(groups);
   text.HoldKey(holder);
   return text;
+}
+
+const SampleTokens& GetSampleTokens() {
+  static const SampleTokens tokens = {MakeDirect("5 groups", kSmallTokenGroups),
+                                      MakeDirect("200 groups", kMediumTokenGroups),
+                                      MakeDirect("5000 groups", kLargeTokenGroups),
+                                      MakeDirect("50000 groups", kHugeTokenGroups), MakeIssuedSample()};
+  return tokens;
 }
 
 }  // namespace Bench
