@@ -6,6 +6,7 @@
 // memory was asked for: one line each, in bytes. A token of the same signer has been validated before, so
 // what is remembered for good does not count.
 
+#include "bench/ReadFile.h"
 #include "extremes/AllocationCount.h"
 
 #include <pelmar/crypto/Certificate.h>
@@ -14,20 +15,11 @@
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
-#include <fstream>
-#include <iterator>
-#include <stdexcept>
 #include <string>
 
 namespace {
 
-std::string ReadFile(const char* path) {
-  std::ifstream file(path, std::ios::binary);
-  if (!file) {
-    throw std::runtime_error(std::string("cannot read ") + path);
-  }
-  return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
-}
+using Bench::ReadFile;
 
 void Print(const char* tokenPath, const char* certificatePath) {
   const std::string token = ReadFile(tokenPath);

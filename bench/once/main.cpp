@@ -5,26 +5,19 @@
 // certificate of another, and ends. It is a host like any other, over the shared libraries; bench/report.py
 // times its start and counts its instructions.
 
+#include "bench/ReadFile.h"
+
 #include <pelmar/crypto/Certificate.h>
 #include <quorlin/SamlToken.h>
 
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
-#include <fstream>
-#include <iterator>
-#include <stdexcept>
 #include <string>
 
 namespace {
 
-std::string ReadFile(const char* path) {
-  std::ifstream file(path, std::ios::binary);
-  if (!file) {
-    throw std::runtime_error(std::string("cannot read ") + path);
-  }
-  return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
-}
+using Bench::ReadFile;
 
 void Validate(const std::string& token, const std::string& certificate, unsigned long count) {
   const auto trusted = Pelmar::Crypto::CreateCertificatesFromPem(certificate);

@@ -6,30 +6,24 @@
 #ifndef QUORLIN_BENCH_PEERS_PEERLOOP_H
 #define QUORLIN_BENCH_PEERS_PEERLOOP_H
 
+#include "bench/ReadFile.h"
+
 #include <cstddef>
 #include <exception>
-#include <fstream>
 #include <iostream>
-#include <iterator>
 #include <stdexcept>
 #include <string>
 #include <vector>
 
 namespace Peers {
 
+using Bench::ReadFile;
+
 /// What a peer read out of a token that it accepted.
 struct Findings {
   std::string subject;
   std::vector<std::string> groups;
 };
-
-inline std::string ReadFile(const std::string& path) {
-  std::ifstream file(path, std::ios::binary);
-  if (!file) {
-    throw std::runtime_error("cannot read " + path);
-  }
-  return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
-}
 
 inline void Require(bool holds, const char* what) {
   if (!holds) {
