@@ -38,8 +38,8 @@ std::string Write(const ElementNode* element) {
 }
 
 bool HasSameAttributes(const ElementNode* a, const ElementNode* b) {
-  const std::vector<Attribute>& left = a->GetAttributes();
-  const std::vector<Attribute>& right = b->GetAttributes();
+  const AttributeList& left = a->GetAttributes();
+  const AttributeList& right = b->GetAttributes();
   if (left.size() != right.size()) {
     return false;
   }

@@ -20,6 +20,10 @@ namespace {
 typedef std::vector<std::string> Names;
 typedef std::vector<QName> QNames;
 
+// Such lists are static where they are used: each costs an allocation, and an assertion has dozens of
+// elements.
+const Names kNone;
+
 const char* const kBearerMethod = "urn:oasis:names:tc:SAML:2.0:cm:bearer";
 const char* const kHolderOfKeyMethod = "urn:oasis:names:tc:SAML:2.0:cm:holder-of-key";
 
@@ -43,11 +47,10 @@ void RequireEnd(const NodeFilterIterator& it, const char* complaint) {
 }
 
 // An element that holds nothing but text and whose attributes do not matter.
-std::string ParseTextElement(const NodeFilterIterator& it, const char* localName, const char* namespaceUri) {
+const std::string& ParseTextElement(const NodeFilterIterator& it, const char* localName,
+                                    const char* namespaceUri) {
   RequireElement(it, localName, namespaceUri);
-  std::string text;
-  RequireTextualContent(it, text);
-  return text;
+  return RequireTextualContent(it);
 }
 
 SamlToken::ConfirmationType ParseConfirmationMethod(const std::string& method) {
@@ -62,14 +65,17 @@ SamlToken::ConfirmationType ParseConfirmationMethod(const std::string& method) {
 
 void ParseBearerConfirmationData(const NodeFilterIterator& it, SubjectConfirmationDataType& data) {
   const ElementNode* element = IteratorToElement(it);
-  RequireElementAttributesNames(element, Names{"NotOnOrAfter"}, Names());
+  static const Names kRequired{"NotOnOrAfter"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   RequireEmptyElement(it);
   GetDateAttribute(element, "NotOnOrAfter", data.NotOnOrAfter);
 }
 
 void ParseHolderOfKeyConfirmationData(const NodeFilterIterator& it, SubjectConfirmationDataType& data) {
   const ElementNode* element = IteratorToElement(it);
-  RequireElementAttributesQNames(element, QNames{kXsiType}, QNames{LocalName("NotOnOrAfter")});
+  static const QNames kRequired{kXsiType};
+  static const QNames kAllowed{LocalName("NotOnOrAfter")};
+  RequireElementAttributesQNames(element, kRequired, kAllowed);
   if (!ElementXsiTypeIs(element, kKeyInfoConfirmationDataType)) {
     std::string type;
     element->GetAttribute(kXsiType, type);
@@ -127,7 +133,8 @@ bool TryParseRestriction(NodeFilterIterator& it, ConditionsType& conditions) {
 }
 
 AdviceAttribute ToAdviceAttribute(AttributeType&& attribute) {
-  return AdviceAttribute{std::move(attribute.Name), std::move(attribute.Values)};
+  return AdviceAttribute{std::move(attribute.Name),
+                         std::vector<std::string>(attribute.Values.begin(), attribute.Values.end())};
 }
 
 void ParseAdviceElement(const NodeFilterIterator& it, AdviceType& advice) {
@@ -145,7 +152,8 @@ void ParseAdviceElement(const NodeFilterIterator& it, AdviceType& advice) {
 
 void ParseSamlAssertionElement(NodeFilterIterator it, SamlAssertionType& assertion) {
   ElementNode* element = RequireElement(it, "Assertion", kSaml);
-  RequireElementAttributesNames(element, Names{"Version", "ID", "IssueInstant"}, Names());
+  static const Names kRequired{"Version", "ID", "IssueInstant"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   assertion.Version = AttributeValue(element, "Version");
   assertion.ID = AttributeValue(element, "ID");
   GetDateAttribute(element, "IssueInstant", assertion.IssueInstant);
@@ -176,7 +184,8 @@ void ParseSamlIssuerElement(NodeFilterIterator it, NameIDType& issuer) {
 
 void ParseNameIDType(NodeFilterIterator it, NameIDType& nameId) {
   const ElementNode* element = IteratorToElement(it);
-  RequireElementAttributesNames(element, Names{"Format"}, Names());
+  static const Names kRequired{"Format"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   nameId.first = AttributeValue(element, "Format");
   RequireTextualContent(it, nameId.second);
 }
@@ -199,7 +208,8 @@ void ParseSubjectNameIdElement(NodeFilterIterator it, NameIDType& nameId) {
 
 void ParseSubjectConfirmationElement(NodeFilterIterator it, SubjectConfirmationType& confirmation) {
   const ElementNode* element = RequireElement(it, "SubjectConfirmation", kSaml);
-  RequireElementAttributesNames(element, Names{"Method"}, Names());
+  static const Names kRequired{"Method"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   confirmation.Method = ParseConfirmationMethod(AttributeValue(element, "Method"));
 
   it.MoveToChild();
@@ -233,7 +243,8 @@ void ParseSubjectConfirmationDataKeyInfoElement(NodeFilterIterator it, SubjectCo
 
 void ParseConditionsElement(NodeFilterIterator it, ConditionsType& conditions) {
   const ElementNode* element = RequireElement(it, "Conditions", kSaml);
-  RequireElementAttributesNames(element, Names{"NotBefore", "NotOnOrAfter"}, Names());
+  static const Names kRequired{"NotBefore", "NotOnOrAfter"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   GetDateAttribute(element, "NotBefore", conditions.NotBefore);
   GetDateAttribute(element, "NotOnOrAfter", conditions.NotOnOrAfter);
   it.MoveToChild();
@@ -264,7 +275,8 @@ void TryParseProxyRestriction(NodeFilterIterator& it, boost::optional<ProxyRestr
     return;
   }
   ProxyRestrictionType parsed;
-  RequireElementAttributesNames(element, Names(), Names{"Count"});
+  static const Names kAllowed{"Count"};
+  RequireElementAttributesNames(element, kNone, kAllowed);
   RequireEmptyElement(it);
   GetULongOptionalAttribute(element, "Count", parsed.Count);
   restriction = parsed;
@@ -277,9 +289,9 @@ void TryParseRenewRestriction(NodeFilterIterator& it, boost::optional<RenewRestr
   }
   const ElementNode* element = IteratorToElement(it);
   RenewRestrictionType parsed;
-  RequireElementAttributesQNames(
-      element, QNames{kXsiType},
-      QNames{LocalName("Count"), LocalName("Postdatable"), LocalName("RenewExpired")});
+  static const QNames kRequired{kXsiType};
+  static const QNames kAllowed{LocalName("Count"), LocalName("Postdatable"), LocalName("RenewExpired")};
+  RequireElementAttributesQNames(element, kRequired, kAllowed);
   GetULongOptionalAttribute(element, "Count", parsed.Count);
   restriction = parsed;
   it.MoveToSibling();
@@ -291,7 +303,8 @@ void TryParseDelegationRestriction(NodeFilterIterator& it,
     return;
   }
   DelegationRestrictionType parsed;
-  RequireElementAttributesQNames(IteratorToElement(it), QNames{kXsiType}, QNames());
+  static const QNames kRequired{kXsiType};
+  RequireElementAttributesQNames(IteratorToElement(it), kRequired, QNames());
   NodeFilterIterator child = it.GetChild();
   do {
     parsed.Delegate.emplace_back();
@@ -303,7 +316,8 @@ void TryParseDelegationRestriction(NodeFilterIterator& it,
 
 void ParseDelegate(NodeFilterIterator it, DelegateType& delegate) {
   const ElementNode* element = RequireElement(it, "Delegate", kSamlDelegation);
-  RequireElementAttributesNames(element, Names{"DelegationInstant"}, Names());
+  static const Names kRequired{"DelegationInstant"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   GetDateAttribute(element, "DelegationInstant", delegate.DelegationInstant);
   it.MoveToChild();
   RequireElement(it, "NameID", kSaml);
@@ -324,7 +338,8 @@ void TryParseAdviceElement(NodeFilterIterator& it, boost::optional<AdviceType>& 
 
 void ParseRsaAdviceElement(NodeFilterIterator it, Advice& advice) {
   const ElementNode* element = RequireElement(it, "RSAAdvice", kSamlExt);
-  RequireElementAttributesNames(element, Names{"AdviceSource"}, Names());
+  static const Names kRequired{"AdviceSource"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   advice.source = AttributeValue(element, "AdviceSource");
   it.MoveToChild();
   do {
@@ -336,7 +351,8 @@ void ParseRsaAdviceElement(NodeFilterIterator it, Advice& advice) {
 
 void ParseAuthnStatementElement(NodeFilterIterator it, AuthnStatementType& statement) {
   const ElementNode* element = RequireElement(it, "AuthnStatement", kSaml);
-  RequireElementAttributesNames(element, Names{"AuthnInstant"}, Names());
+  static const Names kRequired{"AuthnInstant"};
+  RequireElementAttributesNames(element, kRequired, kNone);
   GetDateAttribute(element, "AuthnInstant", statement.AuthnInstant);
   it.MoveToChild();
   ParseAuthnContextElement(it, statement.AuthnContext);
@@ -361,12 +377,16 @@ void ParseAttributeStatementElement(NodeFilterIterator it, AttributeStatementTyp
 
 void ParseAttributeElement(NodeFilterIterator it, AttributeType& attribute) {
   const ElementNode* element = RequireElement(it, "Attribute", kSaml);
-  RequireElementAttributesNames(element, Names{"Name"}, Names{"NameFormat", "FriendlyName"});
+  static const Names kRequired{"Name"};
+  static const Names kAllowed{"NameFormat", "FriendlyName"};
+  RequireElementAttributesNames(element, kRequired, kAllowed);
   attribute.Name = AttributeValue(element, "Name");
   attribute.NameFormat = AttributeValue(element, "NameFormat");
   attribute.FriendlyName = AttributeValue(element, "FriendlyName");
+  attribute.Values.reserve(
+      element->GetChildCount());  // White space counts too, but values come by the thousand.
   for (it.MoveToChild(); it.node != nullptr; it.MoveToSibling()) {
-    attribute.Values.push_back(ParseTextElement(it, "AttributeValue", kSaml));
+    attribute.Values.emplace_back(ParseTextElement(it, "AttributeValue", kSaml));
   }
 }
 

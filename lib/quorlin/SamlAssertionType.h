@@ -17,6 +17,7 @@
 
 #include <set>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -88,7 +89,9 @@ struct AttributeType {
   std::string Name;
   std::string NameFormat;    ///< Empty when absent.
   std::string FriendlyName;  ///< Empty when absent.
-  std::vector<std::string> Values;
+  /// In the text nodes of the tree that was read, and valid as long as it lives: a token may have thousands
+  /// of groups.
+  std::vector<std::string_view> Values;
 };
 
 struct AttributeStatementType {

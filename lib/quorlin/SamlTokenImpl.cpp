@@ -30,6 +30,13 @@ typedef std::list<Ref<const Certificate>> CertificateList;
 
 const char* const kSource = "lib/quorlin/SamlTokenImpl";
 
+// Owned by nobody: the iterators are copied for every element, and counting owners would cost more than the
+// copies.
+boost::shared_ptr<const NodeFilter> GetSignificanceFilter() {
+  static const SkipWsAndCommentsFilter filter;
+  return boost::shared_ptr<const NodeFilter>(boost::shared_ptr<const NodeFilter>(), &filter);
+}
+
 std::string CanonicalText(const ElementNode* element) {
   const Ref<Pelmar::StringWriter> writer = Pelmar::CreateStringWriter();
   Pelmar::Xml::Security::CreateCanonicalizer(Pelmar::Xml::Security::kC14n)
@@ -50,6 +57,12 @@ bool PermitsFurtherUse(const boost::optional<Restriction>& restriction) {
 
 PrincipalId::PrincipalId(const std::string& principalName, const std::string& principalDomain)
     : name(principalName), domain(principalDomain) {
+  Pelmar::Verify(!name.empty(), "!name.empty()", kSource);
+  Pelmar::Verify(!domain.empty(), "!domain.empty()", kSource);
+}
+
+PrincipalId::PrincipalId(std::string&& principalName, std::string&& principalDomain)
+    : name(std::move(principalName)), domain(std::move(principalDomain)) {
   Pelmar::Verify(!name.empty(), "!name.empty()", kSource);
   Pelmar::Verify(!domain.empty(), "!domain.empty()", kSource);
 }
@@ -88,9 +101,8 @@ SamlTokenImpl::SamlTokenImpl(ElementNode* element, const KeyInfoResolver* resolv
 // assertion says is interpreted before its signature held.
 void SamlTokenImpl::InitializeFromDom(ElementNode* element, const KeyInfoResolver* resolver,
                                       long long clockToleranceSec) {
-  const NodeFilterIterator it(element, boost::make_shared<SkipWsAndCommentsFilter>());
   SamlAssertionType assertion;
-  ParseSamlAssertionElement(it, assertion);
+  ParseSamlAssertionElement(NodeFilterIterator(element, GetSignificanceFilter()), assertion);
   CheckTokenProperties(assertion, clockToleranceSec);
   ValidateSignature(assertion.Signature.Get(), resolver);
   PopulateFrom(assertion);
@@ -140,7 +152,7 @@ void SamlTokenImpl::PopulateFrom(const SamlAssertionType& assertion) {
 void SamlTokenImpl::PopulateTokenAttribute(const AttributeType& attribute) {
   if (SamlAttributeIsGroupIdentity(attribute)) {
     _groups.reserve(_groups.size() + attribute.Values.size());
-    for (const std::string& value : attribute.Values) {
+    for (const std::string_view value : attribute.Values) {
       _groups.push_back(ParseGroupIdentity(value));
     }
   } else if (SamlAttributeIsSolution(attribute)) {

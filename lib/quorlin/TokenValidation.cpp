@@ -91,9 +91,9 @@ bool CoversAssertion(const Signature& signature, const std::string& id) {
 }
 
 // Splits at `separator`; true when that gives exactly two parts and neither is empty.
-bool SplitInTwo(const std::string& text, char separator, std::string& first, std::string& second) {
+bool SplitInTwo(std::string_view text, char separator, std::string_view& first, std::string_view& second) {
   const std::size_t at = text.find(separator);
-  if (at == std::string::npos || text.find(separator, at + 1) != std::string::npos) {
+  if (at == std::string_view::npos || text.find(separator, at + 1) != std::string_view::npos) {
     return false;
   }
   first = text.substr(0, at);
@@ -134,27 +134,30 @@ PrincipalId ParseSamlNameId(const NameIDType& nameId) {
   if (nameId.first != kClaimUpn) {
     throw ParseException("Invalid or unsupported NameId format '" + nameId.first + "'");
   }
-  std::string name;
-  std::string domain;
+  std::string_view name;
+  std::string_view domain;
   if (!SplitInTwo(nameId.second, '@', name, domain)) {
     throw ParseException("Failed to parse the UPN NameID: " + nameId.second);
   }
-  return PrincipalId(name, domain);
+  return PrincipalId(std::string(name), std::string(domain));
 }
 
 Delegate ParseToDelegate(const DelegateType& delegate) {
   return Delegate(ParseSamlNameId(delegate.NameID), delegate.DelegationInstant);
 }
 
-PrincipalId ParseGroupIdentity(const std::string& value) {
-  const bool domainFirst = value.find('\\') != std::string::npos;
-  std::string first;
-  std::string second;
+PrincipalId ParseGroupIdentity(std::string_view value) {
+  const bool domainFirst = value.find('\\') != std::string_view::npos;
+  std::string_view first;
+  std::string_view second;
   if (!SplitInTwo(value, domainFirst ? '\\' : '/', first, second)) {
-    throw ParseException("Failed to parse Group Identity value: `" + value +
+    throw ParseException("Failed to parse Group Identity value: `" + std::string(value) +
                          "'; too many/not enough separators");
   }
-  return domainFirst ? PrincipalId(second, first) : PrincipalId(first, second);
+  if (domainFirst) {
+    std::swap(first, second);
+  }
+  return PrincipalId(std::string(first), std::string(second));
 }
 
 bool ParseIsSolutionAttribute(const AttributeType& attribute) {
@@ -165,11 +168,11 @@ bool ParseIsSolutionAttribute(const AttributeType& attribute) {
   if (attribute.Values.size() > 1) {
     throw new ParseException("More than one value found for attribute isSolution.");
   }
-  return Pelmar::StringUtil::ToLower(attribute.Values.front()) == "true";
+  return Pelmar::StringUtil::ToLower(std::string(attribute.Values.front())) == "true";
 }
 
 std::string ParsePrincipalNameAttribute(const AttributeType& attribute) {
-  return attribute.Values.empty() ? std::string() : attribute.Values.front();
+  return attribute.Values.empty() ? std::string() : std::string(attribute.Values.front());
 }
 
 bool SamlAttributeIsGroupIdentity(const AttributeType& attribute) {

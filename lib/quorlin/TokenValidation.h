@@ -33,7 +33,7 @@ PrincipalId ParseSamlNameId(const NameIDType& nameId);
 Delegate ParseToDelegate(const DelegateType& delegate);
 
 /// The group that "DOMAIN\name" or "name/domain" stands for: mind the order. Throws ParseException.
-PrincipalId ParseGroupIdentity(const std::string& value);
+PrincipalId ParseGroupIdentity(std::string_view value);
 
 /// Whether the attribute's one value says "true". Throws a *pointer* to a new ParseException when there is
 /// not exactly one value; callers that handle these errors must catch the pointer and delete it.

@@ -12,6 +12,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <cstring>
 #include <set>
 #include <utility>
 
@@ -19,6 +20,7 @@ namespace Quorlin {
 
 using Pelmar::Xml::AsElement;
 using Pelmar::Xml::AsText;
+using Pelmar::Xml::Attribute;
 using Pelmar::Xml::ElementNode;
 using Pelmar::Xml::Node;
 using Pelmar::Xml::QName;
@@ -34,10 +36,23 @@ namespace {
 // Reports the fatal checks of the token component, of which these functions are the lower half.
 const char* const kSource = "lib/quorlin/SamlTokenImpl";
 
-const char* const kInsignificantCharacters = "\t\n\r ";
+bool IsInsignificant(const std::string& text) {
+  return std::all_of(text.begin(), text.end(),
+                     [](char c) { return c == '\t' || c == '\n' || c == '\r' || c == ' '; });
+}
 
 bool IsNamespaceDeclaration(const std::string& attributeName) {
   return attributeName == "xmlns" || attributeName.compare(0, 6, "xmlns:") == 0;
+}
+
+// XML text has no zero bytes; so this is the comparison of the whole, without measuring `known` first.
+bool Equals(const std::string& text, const char* known) {
+  return std::strcmp(text.c_str(), known) == 0;
+}
+
+bool IsInNamespace(const ElementNode* element, const char* namespaceUri) {
+  const std::string* const uri = element->FindNamespaceUri(element->GetPrefix());
+  return uri != nullptr && Equals(*uri, namespaceUri);
 }
 
 bool Contains(const std::vector<QName>& names, const QName& name) {
@@ -57,6 +72,26 @@ std::string AttributeText(const ElementNode* element, const char* name) {
 // The wording, with its one apostrophe too few, is what existing log tools search for.
 [[noreturn]] void ThrowMissingAttribute(const ElementNode* element, const std::string& name) {
   throw ParseException("Node '" + element->GetLocalName() + " is missing required attribute '" + name + "'");
+}
+
+bool HasAttribute(const ElementNode* element, const std::string& name) {
+  const Pelmar::Xml::AttributeList& attributes = element->GetAttributes();
+  return std::any_of(attributes.begin(), attributes.end(),
+                     [&name](const Attribute& attribute) { return attribute.name == name; });
+}
+
+bool Contains(const std::vector<std::string>& names, const std::string& name) {
+  return std::find(names.begin(), names.end(), name) != names.end();
+}
+
+// `source` is a reader or a text.
+template <typename Source>
+void ParseInto(const Source& source, Pelmar::Ref<Pelmar::Xml::Document>& document) {
+  const Pelmar::Ref<Pelmar::Xml::XMLHandler> handler = Pelmar::Xml::CreateXMLDocumentHandler();
+  const Pelmar::Ref<Pelmar::Xml::XMLParser> parser = Pelmar::Xml::CreateXMLParser(handler);
+  Pelmar::Ref<Pelmar::Object> result;
+  parser->Parse(source, result);
+  document = Pelmar::Xml::ViewAsDocument(result);
 }
 
 [[noreturn]] void ThrowNotTextual(const ElementNode* element) {
@@ -84,7 +119,7 @@ bool SkipWsAndCommentsFilter::Accept(Node* node) const {
     return false;
   }
   const TextNode* text = AsText(node);
-  return text == nullptr || text->GetText().find_first_not_of(kInsignificantCharacters) != std::string::npos;
+  return text == nullptr || !IsInsignificant(text->GetText());
 }
 
 NodeFilterIterator::NodeFilterIterator(Node* startNode, const boost::shared_ptr<const NodeFilter>& nodeFilter)
@@ -120,11 +155,8 @@ QName LocalName(const char* name) {
 }
 
 bool ElementQNameIs(const ElementNode* element, const char* localName, const char* namespaceUri) {
-  if (element == nullptr || element->GetLocalName() != localName) {
-    return false;
-  }
-  const std::string* uri = element->FindNamespaceUri(element->GetPrefix());
-  return uri != nullptr && *uri == namespaceUri;
+  return element != nullptr && Equals(element->GetLocalName(), localName) &&
+         IsInNamespace(element, namespaceUri);
 }
 
 bool ElementXsiTypeIs(const ElementNode* element, const QName& type) {
@@ -156,10 +188,10 @@ void ResolveQName(const ElementNode* element, const std::string& text, const std
 }
 
 void RequireElementQName(const ElementNode* element, const char* localName, const char* namespaceUri) {
-  if (element == nullptr || element->GetLocalName() != localName) {
+  if (element == nullptr || !Equals(element->GetLocalName(), localName)) {
     throw ParseException(std::string("Expected element '") + localName + "' not found.");
   }
-  if (!ElementQNameIs(element, localName, namespaceUri)) {
+  if (!IsInNamespace(element, namespaceUri)) {
     throw ParseException("Element '" + element->GetLocalName() + "' has unexpected namespace");
   }
 }
@@ -172,6 +204,10 @@ void RequireEmptyElement(NodeFilterIterator it) {
 }
 
 void RequireTextualContent(NodeFilterIterator it, std::string& text) {
+  text = RequireTextualContent(it);
+}
+
+const std::string& RequireTextualContent(NodeFilterIterator it) {
   const ElementNode* element = IteratorToElement(it);
   const TextNode* content = AsText(it.MoveToChild().node);
   if (content == nullptr) {
@@ -182,7 +218,7 @@ void RequireTextualContent(NodeFilterIterator it, std::string& text) {
   if (it.MoveToSibling().node != nullptr) {
     ThrowNotTextual(element);
   }
-  text = content->GetText();
+  return content->GetText();
 }
 
 void RequireNoAttributes(const ElementNode* element) {
@@ -191,17 +227,16 @@ void RequireNoAttributes(const ElementNode* element) {
 
 void RequireElementAttributesNames(const ElementNode* element, const std::vector<std::string>& required,
                                    const std::vector<std::string>& allowed) {
-  std::set<std::string> names = element->GetAttributeNames();
   for (const std::string& name : required) {
-    if (names.erase(name) == 0) {
+    if (!HasAttribute(element, name)) {
       ThrowMissingAttribute(element, name);
     }
   }
-  for (const std::string& name : allowed) {
-    names.erase(name);
-  }
-  if (!std::all_of(names.begin(), names.end(), IsNamespaceDeclaration)) {
-    throw ParseException("Unexpected attributes on element '" + element->GetLocalName() + "'");
+  for (const Attribute& attribute : element->GetAttributes()) {
+    const std::string& name = attribute.name;
+    if (!Contains(required, name) && !Contains(allowed, name) && !IsNamespaceDeclaration(name)) {
+      throw ParseException("Unexpected attributes on element '" + element->GetLocalName() + "'");
+    }
   }
 }
 
@@ -262,16 +297,12 @@ void GetULongOptionalAttribute(const ElementNode* element, const char* name,
 }
 
 void ParseXML(Pelmar::Reader* reader, Pelmar::Ref<Pelmar::Xml::Document>& document) {
-  const Pelmar::Ref<Pelmar::Xml::XMLHandler> handler = Pelmar::Xml::CreateXMLDocumentHandler();
-  const Pelmar::Ref<Pelmar::Xml::XMLParser> parser = Pelmar::Xml::CreateXMLParser(handler);
-  Pelmar::Ref<Pelmar::Object> result;
-  parser->Parse(reader, result);
-  document = Pelmar::Xml::ViewAsDocument(result);
+  ParseInto(reader, document);
 }
 
+// Like the reader's form with a string reader, but the text is not copied, which would be two more in memory.
 void ParseXML(const std::string& text, Pelmar::Ref<Pelmar::Xml::Document>& document) {
-  const Pelmar::Ref<Pelmar::Reader> reader = Pelmar::CreateStringReader(text);
-  ParseXML(reader.Get(), document);
+  ParseInto(text, document);
 }
 
 const TextNode* GetTextNode(const Node* node) {

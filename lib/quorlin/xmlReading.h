@@ -85,6 +85,8 @@ void RequireElementQName(const Pelmar::Xml::ElementNode* element, const char* lo
 void RequireEmptyElement(NodeFilterIterator it);
 /// The element must have one significant child and that must be a text, which is returned untrimmed.
 void RequireTextualContent(NodeFilterIterator it, std::string& text);
+/// The same without a copy: the text where it lies in the tree.
+const std::string& RequireTextualContent(NodeFilterIterator it);
 void RequireNoAttributes(const Pelmar::Xml::ElementNode* element);
 /// Compares attribute names as they are written, prefix included. Namespace declarations are always allowed.
 void RequireElementAttributesNames(const Pelmar::Xml::ElementNode* element,

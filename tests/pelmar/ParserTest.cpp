@@ -308,7 +308,10 @@ TEST(XMLParser, RefusesEveryTruncation) {
 // Takes the events and forgets them, so that a limit can be reached without a tree.
 class CountingHandler final : public XMLHandler {
  public:
-  void StartElement(const char*, const char* const*, unsigned long, unsigned long) override { ++elements; }
+  void StartElement(const NameRange&, const AttributeRange*, std::size_t, unsigned long,
+                    unsigned long) override {
+    ++elements;
+  }
   void EndElement(bool) override {}
   void Characters(const char*, std::size_t size) override { characters += size; }
   void Comment(const char*) override {}
@@ -444,15 +447,58 @@ TEST(XMLParserLimits, EndAnEndlessReader) {
   EXPECT_EQ(reader->given, kMaxDocumentBytes + 1u);
 }
 
+TEST(XMLParserLimits, HoldForATextInMemory) {
+  const std::string text = "<a>" + std::string(kMaxDocumentBytes, 'x') + "</a>";
+  Ref<Object> result;
+  try {
+    CreateXMLParser(MakeRef<CountingHandler>())->Parse(text, result);
+    ADD_FAILURE() << "accepted";
+  } catch (const XMLParseException& error) {
+    EXPECT_STREQ(error.what(), "more than 16777216 bytes at line 1, column 1");
+  }
+  EXPECT_EQ(result.Get(), nullptr);
+}
+
+TEST(XMLParser, ReadsATextInMemoryLikeAReader) {
+  for (const std::string text : {"\xEF\xBB\xBF<a>\n<b/></a>", "<a><b></a>", "", "<a>\xC3\xA9</a>\xFF"}) {
+    const auto outcome = [](auto&& source) -> std::string {
+      Ref<Object> result;
+      try {
+        CreateXMLParser(CreateXMLDocumentHandler())->Parse(source, result);
+        const Ref<StringWriter> writer = CreateStringWriter();
+        ViewAsDocument(result)->GetDocumentElement()->WriteXml(writer.Get());
+        return writer->GetText();
+      } catch (const XMLParseException& error) {
+        return error.what();
+      }
+    };
+    const Ref<Reader> reader = CreateStringReader(text);
+    EXPECT_EQ(outcome(text), outcome(reader.Get()));
+  }
+}
+
+TEST(XMLParser, IsUsedOnceWhereverTheTextIs) {
+  const Ref<XMLParser> parser = CreateXMLParser(CreateXMLDocumentHandler());
+  Ref<Object> result;
+  parser->Parse(std::string("<a/>"), result);
+  EXPECT_THROW(parser->Parse(std::string("<a/>"), result), InvalidStateException);
+  EXPECT_THROW(parser->Parse(CreateStringReader("<a/>").Get(), result), InvalidStateException);
+}
+
 // ---- Handlers
+
+std::string Text(const TextRange& range) {
+  EXPECT_EQ(range.data[range.size], '\0');
+  return std::string(range.data, range.size);
+}
 
 class RecordingHandler final : public XMLHandler {
  public:
-  void StartElement(const char* name, const char* const* attributes, unsigned long line,
-                    unsigned long column) override {
-    events += "<" + std::string(name);
-    for (; *attributes != nullptr; attributes += 2) {
-      events += " " + std::string(attributes[0]) + "=" + attributes[1];
+  void StartElement(const NameRange& name, const AttributeRange* attributes, std::size_t attributeCount,
+                    unsigned long line, unsigned long column) override {
+    events += "<" + Text(name.text);
+    for (std::size_t i = 0; i < attributeCount; ++i) {
+      events += " " + Text(attributes[i].name.text) + "=" + Text(attributes[i].value);
     }
     events += "@" + std::to_string(line) + ":" + std::to_string(column) + ">";
   }
@@ -485,7 +531,8 @@ class ThrowingHandler final : public XMLHandler {
  public:
   explicit ThrowingHandler(Event event) : _event(event) {}
 
-  void StartElement(const char*, const char* const*, unsigned long, unsigned long) override {
+  void StartElement(const NameRange&, const AttributeRange*, std::size_t, unsigned long,
+                    unsigned long) override {
     Happened(Event::START);
   }
   void EndElement(bool) override { Happened(Event::END); }

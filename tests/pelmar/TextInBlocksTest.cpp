@@ -82,7 +82,7 @@ TEST(TextInBlocks, AColumnIsACharacterWhereverItStands) {
   for (const char* const character : {"\xC3\xA9", "\xE2\x82\xAC", "\xF0\x9F\x98\x80"}) {
     for (std::size_t place = 0; place <= kTextBytes; ++place) {
       const std::string text = PutAt(place, character) + character;
-      Xml::TextPlace counted(text.data());
+      Xml::TextPlace counted(text);
       counted.AdvanceTo(text.data() + text.size());
       EXPECT_EQ(counted.GetLine(), 1u) << place;
       EXPECT_EQ(counted.GetColumn(), kTextBytes + 3) << place;

@@ -450,7 +450,7 @@ TEST(AssertionParser, ReadsAttributes) {
         EXPECT_EQ(statement.Attribute[0].Name, "n1");
         EXPECT_EQ(statement.Attribute[0].NameFormat, "f");
         EXPECT_EQ(statement.Attribute[0].FriendlyName, "x");
-        EXPECT_EQ(statement.Attribute[0].Values, (std::vector<std::string>{"v2", "v1"}));
+        EXPECT_EQ(statement.Attribute[0].Values, (std::vector<std::string_view>{"v2", "v1"}));
         EXPECT_EQ(statement.Attribute[1].NameFormat, "");
         EXPECT_EQ(statement.Attribute[1].FriendlyName, "");
         EXPECT_TRUE(statement.Attribute[1].Values.empty());

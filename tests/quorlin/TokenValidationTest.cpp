@@ -429,14 +429,14 @@ TEST(ParseGroupIdentity, RefusesOtherNumbersOfParts) {
 
 // --- Attributes ---
 
-AttributeType AttributeNamed(const std::string& name, const std::vector<std::string>& values = {}) {
+AttributeType AttributeNamed(const std::string& name, const std::vector<std::string_view>& values = {}) {
   AttributeType attribute;
   attribute.Name = name;
   attribute.Values = values;
   return attribute;
 }
 
-std::string SolutionOf(const std::vector<std::string>& values) {
+std::string SolutionOf(const std::vector<std::string_view>& values) {
   bool isSolution = false;
   const std::string verdict =
       VerdictOf([&] { isSolution = ParseIsSolutionAttribute(AttributeNamed(kAttrIsSolution, values)); });

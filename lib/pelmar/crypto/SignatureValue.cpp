@@ -12,6 +12,8 @@
 
 #include <openssl/rsa.h>
 
+#include <utility>
+
 namespace Pelmar {
 namespace Crypto {
 
@@ -53,8 +55,13 @@ bool VerifySignatureValue(const Certificate* certificate, DigestAlgorithm algori
   if (type == KEY_EC && value.size() != GetEcOrderBytes(key) * 2) {
     return false;
   }
-  const KeyContextHandle context = StartVerification(key, type, algorithm);
-  return IsSignature(context.get(), digest, type == KEY_EC ? EcdsaValueToDer(value) : value);
+  KeyContextHandle context = signer->GetVerificationContexts().Take(algorithm);
+  if (!context) {
+    context = StartVerification(key, type, algorithm);
+  }
+  const bool holds = IsSignature(context.get(), digest, type == KEY_EC ? EcdsaValueToDer(value) : value);
+  signer->GetVerificationContexts().Give(algorithm, std::move(context));
+  return holds;
 }
 
 }  // namespace Crypto

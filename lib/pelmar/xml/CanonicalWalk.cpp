@@ -157,21 +157,22 @@ void CanonicalWalk::WriteLeaf(const Node* node) {
 // ---- Elements
 
 void CanonicalWalk::StartElement(const ElementNode* element) {
-  const std::size_t firstRendered = _rendered.size();
-  _frames.push_back({_inScope.size(), firstRendered});
+  Frame frame = {_inScope.size(), _rendered.size(), element, nullptr};
   TakeAttributes(element);
   if (_atApex && !_form.exclusive) {
     InheritXmlAttributes(element);
   }
-  const std::string* const uri = RequireDeclared(element, element->GetPrefix());
+  const bool hasPrefixOfParent = HasPrefixOfParent(element, frame);
+  frame.uri = hasPrefixOfParent ? _frames.back().uri : RequireDeclared(element, element->GetPrefix());
   ResolveAttributes(element);
-  RenderNamespaces(element->GetPrefix(), uri);
+  RenderNamespaces(frame, hasPrefixOfParent);
   SortAttributes();
+  _frames.push_back(frame);
   _atApex = false;
 
   _sink.Put('<');
   _sink.PutQualifiedName(element);
-  for (std::size_t i = firstRendered; i < _rendered.size(); ++i) {
+  for (std::size_t i = frame.rendered; i < _rendered.size(); ++i) {
     const Binding& binding = _rendered[i];
     _sink.Put(binding.prefix.empty() ? " xmlns" : " xmlns:");
     _sink.Put(binding.prefix);
@@ -263,6 +264,9 @@ void CanonicalWalk::ResolveAttributes(const ElementNode* element) {
 // Canonical XML 1.0, section 2.2: by namespace URI, then local name; those without a namespace come first.
 // The order of UTF-8 bytes is the order of code points.
 void CanonicalWalk::SortAttributes() {
+  if (_attributes.size() < 2) {
+    return;
+  }
   std::sort(_attributes.begin(), _attributes.end(), [](const PlainAttribute& a, const PlainAttribute& b) {
     const int order = CompareUris(a.uri, b.uri);
     return order != 0 ? order < 0 : a.localName < b.localName;
@@ -271,15 +275,23 @@ void CanonicalWalk::SortAttributes() {
 
 // ---- Namespaces
 
+// As most elements do, and then it stands for the same, which the parent or one further out has rendered. To
+// look that up for each element is a quarter of the work.
+bool CanonicalWalk::HasPrefixOfParent(const ElementNode* element, const Frame& frame) const noexcept {
+  return !_atApex && frame.inScope == _inScope.size() &&
+         element->GetPrefix() == _frames.back().element->GetPrefix();
+}
+
 // Appends to _rendered what the element is to declare, sorted by prefix (Canonical XML 1.0, section 2.2).
-void CanonicalWalk::RenderNamespaces(std::string_view elementPrefix, const std::string* elementUri) {
-  const std::size_t firstRendered = _rendered.size();
-  RenderDeclared(_atApex ? 0 : _frames.back().inScope);
+void CanonicalWalk::RenderNamespaces(const Frame& frame, bool isPrefixRendered) {
+  RenderDeclared(_atApex ? 0 : frame.inScope);
   if (_form.exclusive) {
-    RenderUsed(elementPrefix, elementUri);
+    RenderUsed(frame, isPrefixRendered);
   }
-  std::sort(_rendered.begin() + static_cast<std::ptrdiff_t>(firstRendered), _rendered.end(),
-            [](const Binding& a, const Binding& b) { return a.prefix < b.prefix; });
+  if (_rendered.size() - frame.rendered > 1) {
+    std::sort(_rendered.begin() + static_cast<std::ptrdiff_t>(frame.rendered), _rendered.end(),
+              [](const Binding& a, const Binding& b) { return a.prefix < b.prefix; });
+  }
 }
 
 // Inclusive treatment: what is in scope at the apex, and further in what an element declares itself. Of
@@ -297,8 +309,10 @@ void CanonicalWalk::RenderDeclared(std::size_t first) {
 }
 
 // Exclusive XML Canonicalization 1.0, section 3: what the element and its attributes visibly use.
-void CanonicalWalk::RenderUsed(std::string_view elementPrefix, const std::string* elementUri) {
-  Render(elementPrefix, elementUri);
+void CanonicalWalk::RenderUsed(const Frame& frame, bool isPrefixRendered) {
+  if (!isPrefixRendered) {
+    Render(frame.element->GetPrefix(), frame.uri);
+  }
   for (const PlainAttribute& plain : _attributes) {
     if (!plain.prefix.empty()) {
       Render(plain.prefix, plain.uri);

@@ -59,6 +59,8 @@ class CanonicalWalk final {
   struct Frame {
     std::size_t inScope;
     std::size_t rendered;
+    const ElementNode* element;
+    const std::string* uri;  // What the element's own prefix stands for.
   };
 
   void WriteDocument(const Document* document);
@@ -78,9 +80,10 @@ class CanonicalWalk final {
   void ResolveAttributes(const ElementNode* element);
   void SortAttributes();
 
-  void RenderNamespaces(std::string_view elementPrefix, const std::string* elementUri);
+  bool HasPrefixOfParent(const ElementNode* element, const Frame& frame) const noexcept;
+  void RenderNamespaces(const Frame& frame, bool isPrefixRendered);
   void RenderDeclared(std::size_t first);
-  void RenderUsed(std::string_view elementPrefix, const std::string* elementUri);
+  void RenderUsed(const Frame& frame, bool isPrefixRendered);
   void Render(std::string_view prefix, const std::string* uri);
   bool IsInclusive(std::string_view prefix) const noexcept;
 

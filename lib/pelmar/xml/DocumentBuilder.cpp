@@ -3,47 +3,66 @@
 
 #include "pelmar/xml/DocumentBuilder.h"
 
-#include <cstring>
+#include "pelmar/core/PerThread.h"
+#include "pelmar/xml/NameRules.h"
+
+#include <array>
+#include <cstdint>
+#include <string>
+#include <string_view>
 
 namespace Pelmar {
 namespace Xml {
 
 namespace {
 
-void AssignName(const char* name, std::string& prefix, std::string& localName) {
-  const char* const colon = std::strchr(name, ':');
-  if (colon == nullptr) {
-    localName.assign(name);
-    return;
-  }
-  prefix.assign(name, colon);
-  localName.assign(colon + 1);
+Ref<const ElementName> MakeName(const NameParts& parts) {
+  return MakeRef<const ElementName>(std::string(parts.prefix), std::string(parts.localName));
 }
 
-void AssignAttributes(const char* const* attributes, std::vector<Attribute>& result) {
-  std::size_t count = 0;
-  while (attributes[2 * count] != nullptr) {
-    ++count;
+constexpr std::size_t kRememberedNames = 64;
+constexpr std::size_t kMaxBytesOfRememberedName = 64;
+
+using RememberedNames = std::array<Ref<const ElementName>, kRememberedNames>;
+
+// Names repeat, within a document and from one to the next. Each has one place where it may be remembered,
+// and whoever comes later to that place takes it over: a foreign document can have a hundred thousand names,
+// chosen so as to meet in any table that keeps them all.
+Ref<const ElementName> ShareName(const NameRange& name) {
+  const std::string_view text = ViewOf(name.text);
+  const NameParts parts = PartsOf(name);
+  RememberedNames* const names = PerThread<RememberedNames>::Get();
+  if (names == nullptr || text.size() > kMaxBytesOfRememberedName) {
+    return MakeName(parts);
   }
-  result.resize(count);
-  for (std::size_t i = 0; i < count; ++i) {
-    result[i].name.assign(attributes[2 * i]);
-    result[i].value.assign(attributes[2 * i + 1]);
+  const std::size_t mix = text.size() * 31 + static_cast<unsigned char>(text.back()) * 7 +
+                          static_cast<unsigned char>(text[text.size() / 2]);
+  Ref<const ElementName>& place = (*names)[mix % kRememberedNames];
+  if (!place || place->qualifiedName != text) {
+    place = MakeName(parts);
   }
+  return place;
 }
 
 }  // namespace
 
 DocumentBuilder::DocumentBuilder() : _document(new Document()), _current(_document.Get()) {}
 
-void DocumentBuilder::StartElement(const char* name, const char* const* attributes, unsigned long line,
-                                   unsigned long column) {
-  ElementNode* const element = new ElementNode(std::string(), std::string());
+void DocumentBuilder::StartElement(const NameRange& name, const AttributeRange* attributes,
+                                   std::size_t attributeCount, unsigned long line, unsigned long column) {
+  ElementNode* const element = new ElementNode(ShareName(name));
   Append(element);
-  AssignName(name, element->_prefix, element->_localName);
-  AssignAttributes(attributes, element->_attributes);
-  element->_line = line;
-  element->_column = column;
+  element->_line = static_cast<std::uint32_t>(line);
+  element->_column = static_cast<std::uint32_t>(column);
+  element->_attributes.reserve(attributeCount);
+  for (std::size_t i = 0; i < attributeCount; ++i) {
+    const TextRange& attributeName = attributes[i].name.text;
+    const TextRange& value = attributes[i].value;
+    element->_attributes.emplace_back();
+    element->_attributes.back().name.assign(attributeName.data, attributeName.size);
+    element->_attributes.back().value.assign(value.data, value.size);
+    element->_declaresNamespaces = element->_declaresNamespaces || IsNamespaceDeclaration(attributes[i].name);
+  }
   _current = element;
 }
 

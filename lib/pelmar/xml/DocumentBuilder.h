@@ -9,6 +9,8 @@
 #include <pelmar/xml/Node.h>
 #include <pelmar/xml/Parser.h>
 
+#include <cstddef>
+
 namespace Pelmar {
 namespace Xml {
 
@@ -17,8 +19,8 @@ class DocumentBuilder final : public XMLHandler {
  public:
   DocumentBuilder();
 
-  void StartElement(const char* name, const char* const* attributes, unsigned long line,
-                    unsigned long column) override;
+  void StartElement(const NameRange& name, const AttributeRange* attributes, std::size_t attributeCount,
+                    unsigned long line, unsigned long column) override;
   void EndElement(bool emptyTag) override;
   void Characters(const char* text, std::size_t size) override;
   void Comment(const char* text) override;

@@ -3,10 +3,13 @@
 
 #include "pelmar/xml/ExpatSession.h"
 
+#include "pelmar/xml/SpareExpat.h"
+
 #include <pelmar/StringUtil.h>
 
 #include <cstring>
 #include <limits>
+#include <utility>
 
 namespace Pelmar {
 namespace Xml {
@@ -20,18 +23,25 @@ std::string MoreThan(std::size_t limit, const char* what) {
   return "more than " + std::to_string(limit) + " " + what;
 }
 
-std::size_t CountAttributes(const char* const* attributes) noexcept {
-  std::size_t count = 0;
-  while (attributes[2 * count] != nullptr) {
-    ++count;
-  }
-  return count;
+TextRange MakeRange(const char* text) noexcept {
+  return TextRange{text, std::strlen(text)};
+}
+
+NameRange MakeName(const char* text) noexcept {
+  const TextRange range = MakeRange(text);
+  const void* const colon = std::memchr(text, ':', range.size);
+  return NameRange{
+      range, colon == nullptr ? 0 : static_cast<std::size_t>(static_cast<const char*>(colon) - text) + 1};
 }
 
 }  // namespace
 
 ExpatSession::ExpatSession(XMLHandler* handler, std::string_view text)
-    : _parser(CreateExpat()), _handler(handler), _text(text), _place(text.data()) {
+    : _parser(TakeExpat()), _handler(handler), _text(text), _place(text) {
+  constexpr std::size_t kUsualAttributes = 8;
+  constexpr std::size_t kUsualDepth = 16;
+  _attributes.reserve(kUsualAttributes);
+  _outerAttributes.reserve(kUsualDepth);
   XML_ParserStruct* const parser = _parser.get();
   XML_SetUserData(parser, this);
   XML_SetElementHandler(parser, OnStartElement, OnEndElement);
@@ -55,6 +65,7 @@ void ExpatSession::Run() {
   if (status != XML_STATUS_OK) {
     ThrowParserError();
   }
+  KeepExpat(std::move(_parser), _text.size());
 }
 
 void ExpatSession::ThrowParserError() const {
@@ -96,16 +107,14 @@ void ExpatSession::StartElement(const char* name, const char* const* attributes)
   if (_outerAttributes.size() > kMaxElementDepth) {
     Refuse(MoreThan(kMaxElementDepth, "elements inside each other"));
   }
-  const std::size_t count = CountAttributes(attributes);
-  if (count > kMaxAttributesPerElement) {
-    Refuse(MoreThan(kMaxAttributesPerElement, "attributes on one element"));
-  }
-  CountNodes(1 + count);
-  _attributesInScope += count;
+  TakeAttributes(attributes);
+  CountNodes(1 + _attributes.size());
+  _attributesInScope += _attributes.size();
   if (_attributesInScope > kMaxAttributesInScope) {
     Refuse(MoreThan(kMaxAttributesInScope, "attributes in scope"));
   }
-  const char* const fault = _namespaces.EnterElement(name, attributes);
+  const NameRange elementName = MakeName(name);
+  const char* const fault = _namespaces.EnterElement(elementName, _attributes);
   if (fault != nullptr) {
     Refuse(fault);
   }
@@ -113,7 +122,19 @@ void ExpatSession::StartElement(const char* name, const char* const* attributes)
     Refuse(MoreThan(kMaxNamespaceDeclarationsInScope, "namespace declarations in scope"));
   }
   _place.AdvanceTo(_text.data() + XML_GetCurrentByteIndex(_parser.get()));
-  _handler->StartElement(name, attributes, _place.GetLine(), _place.GetColumn());
+  _handler->StartElement(elementName, _attributes.data(), _attributes.size(), _place.GetLine(),
+                         _place.GetColumn());
+}
+
+// Measures each text once for all who look at it.
+void ExpatSession::TakeAttributes(const char* const* attributes) {
+  _attributes.clear();
+  for (; *attributes != nullptr; attributes += 2) {
+    if (_attributes.size() == kMaxAttributesPerElement) {
+      Refuse(MoreThan(kMaxAttributesPerElement, "attributes on one element"));
+    }
+    _attributes.push_back({MakeName(attributes[0]), MakeRange(attributes[1])});
+  }
 }
 
 void ExpatSession::EndElement() {

@@ -44,6 +44,7 @@ class ExpatSession final {
   void CountNodes(std::size_t count);
 
   void StartElement(const char* name, const char* const* attributes);
+  void TakeAttributes(const char* const* attributes);
   void EndElement();
   void ProcessingInstruction(const char* target, const char* data);
   void XmlDeclaration(const char* version, const char* encoding) const;
@@ -67,6 +68,7 @@ class ExpatSession final {
   std::string_view _text;
   TextPlace _place;
   NamespaceChecker _namespaces;
+  std::vector<AttributeRange> _attributes;  // Of the start tag at hand.
   // For each open element, how many attributes were in scope outside it.
   std::vector<std::size_t> _outerAttributes;
   std::size_t _attributesInScope = 0;

@@ -91,14 +91,21 @@ bool IsNamespaceDeclaration(std::string_view attributeName, std::string_view& pr
   return true;
 }
 
-bool IsQualifiedName(std::string_view name) noexcept {
-  const std::size_t colon = name.find(':');
-  if (colon == std::string_view::npos) {
+bool IsNamespaceDeclaration(const NameRange& attributeName) noexcept {
+  constexpr std::string_view kXmlns = "xmlns";
+  const std::string_view text = ViewOf(attributeName.text);
+  return attributeName.localStart == 0
+             ? text == kXmlns
+             : attributeName.localStart == kXmlns.size() + 1 && text.substr(0, kXmlns.size()) == kXmlns;
+}
+
+bool IsQualifiedName(const NameRange& name) noexcept {
+  if (name.localStart == 0) {
     return true;
   }
-  const std::string_view localName = name.substr(colon + 1);
-  return colon > 0 && !localName.empty() && localName.find(':') == std::string_view::npos &&
-         MayBeginName(localName);
+  const NameParts parts = PartsOf(name);
+  return !parts.prefix.empty() && !parts.localName.empty() &&
+         parts.localName.find(':') == std::string_view::npos && MayBeginName(parts.localName);
 }
 
 const char* FindDeclarationFault(std::string_view prefix, std::string_view uri) noexcept {

@@ -6,6 +6,8 @@
 #ifndef PELMAR_XML_NAMERULES_H
 #define PELMAR_XML_NAMERULES_H
 
+#include <pelmar/xml/Parser.h>
+
 #include <string>
 #include <string_view>
 
@@ -23,13 +25,29 @@ struct NameParts {
 
 NameParts SplitName(std::string_view name) noexcept;
 
+// What the parser hands on: measured, and cut at the colon, once.
+
+inline std::string_view ViewOf(const TextRange& range) noexcept {
+  return std::string_view(range.data, range.size);
+}
+
+inline NameParts PartsOf(const NameRange& name) noexcept {
+  const std::string_view text = ViewOf(name.text);
+  if (name.localStart == 0) {
+    return {std::string_view(), text};
+  }
+  return {text.substr(0, name.localStart - 1), text.substr(name.localStart)};
+}
+
+bool IsNamespaceDeclaration(const NameRange& attributeName) noexcept;
+
 /// Whether an attribute of this name declares a namespace; then `prefix` is the declared one, empty for the
 /// default namespace.
 bool IsNamespaceDeclaration(std::string_view attributeName, std::string_view& prefix) noexcept;
 
 /// Whether `name`, known to be a Name of XML 1.0, is also a QName: at most one colon, and a name on both
 /// sides of it (Namespaces in XML 1.0, section 4).
-bool IsQualifiedName(std::string_view name) noexcept;
+bool IsQualifiedName(const NameRange& name) noexcept;
 
 /// What is wrong with binding `prefix` (empty: the default namespace) to `uri`; null when nothing is
 /// (Namespaces in XML 1.0, sections 2.2 and 3).

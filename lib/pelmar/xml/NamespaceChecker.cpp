@@ -15,17 +15,25 @@ constexpr std::size_t kNumberOfXmlNamespace = static_cast<std::size_t>(-1);
 
 }  // namespace
 
-const char* NamespaceChecker::EnterElement(const char* name, const char* const* attributes) {
+NamespaceChecker::NamespaceChecker() {
+  constexpr std::size_t kUsualDepth = 16;
+  constexpr std::size_t kUsualDeclarations = 8;
+  _outerCounts.reserve(kUsualDepth);
+  _bindings.reserve(kUsualDeclarations);
+}
+
+const char* NamespaceChecker::EnterElement(const NameRange& name,
+                                           const std::vector<AttributeRange>& attributes) {
   if (!IsQualifiedName(name)) {
     return "malformed element name";
   }
-  if (SplitName(name).prefix == "xmlns") {
+  if (PartsOf(name).prefix == "xmlns") {
     return "an element has the prefix xmlns";
   }
   _outerCounts.push_back(_bindingCount);
   _prefixedCount = 0;
-  for (const char* const* entry = attributes; *entry != nullptr; entry += 2) {
-    const char* const fault = TakeAttribute(entry[0], entry[1]);
+  for (const AttributeRange& attribute : attributes) {
+    const char* const fault = TakeAttribute(attribute);
     if (fault != nullptr) {
       return fault;
     }
@@ -40,15 +48,18 @@ void NamespaceChecker::LeaveElement() noexcept {
   _outerCounts.pop_back();
 }
 
-const char* NamespaceChecker::TakeAttribute(std::string_view name, std::string_view value) {
+const char* NamespaceChecker::TakeAttribute(const AttributeRange& attribute) {
+  const NameRange& name = attribute.name;
   if (!IsQualifiedName(name)) {
     return "malformed attribute name";
   }
-  std::string_view prefix;
-  if (!IsNamespaceDeclaration(name, prefix)) {
-    _prefixedCount += name.find(':') != std::string_view::npos ? 1 : 0;
+  if (!IsNamespaceDeclaration(name)) {
+    _prefixedCount += name.localStart != 0 ? 1 : 0;
     return nullptr;
   }
+  // "xmlns" declares the default namespace, "xmlns:" and a prefix that prefix.
+  const std::string_view prefix = name.localStart == 0 ? std::string_view() : PartsOf(name).localName;
+  const std::string_view value = ViewOf(attribute.value);
   const char* const fault = FindDeclarationFault(prefix, value);
   if (fault != nullptr) {
     return fault;
@@ -96,10 +107,10 @@ bool NamespaceChecker::FindNamespaceNumber(std::string_view prefix, std::size_t&
 
 // Namespaces in XML 1.0, section 6.3: no two attributes with the same expanded name. Attributes whose prefix
 // is not declared have none.
-bool NamespaceChecker::HasDuplicate(const char* const* attributes) {
+bool NamespaceChecker::HasDuplicate(const std::vector<AttributeRange>& attributes) {
   _prefixedAttributes.clear();
-  for (const char* const* entry = attributes; *entry != nullptr; entry += 2) {
-    const NameParts parts = SplitName(entry[0]);
+  for (const AttributeRange& attribute : attributes) {
+    const NameParts parts = PartsOf(attribute.name);
     std::size_t number = 0;
     if (parts.prefix.empty() || parts.prefix == "xmlns" || !FindNamespaceNumber(parts.prefix, number)) {
       continue;

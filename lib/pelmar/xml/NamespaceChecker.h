@@ -6,6 +6,8 @@
 #ifndef PELMAR_XML_NAMESPACECHECKER_H
 #define PELMAR_XML_NAMESPACECHECKER_H
 
+#include <pelmar/xml/Parser.h>
+
 #include <cstddef>
 #include <string>
 #include <string_view>
@@ -18,13 +20,12 @@ namespace Xml {
 /// that a start tag costs no allocation once the deepest nesting was seen.
 class NamespaceChecker final {
  public:
-  NamespaceChecker() = default;
+  NamespaceChecker();
   NamespaceChecker(const NamespaceChecker&) = delete;
   NamespaceChecker& operator=(const NamespaceChecker&) = delete;
 
-  /// Takes a start tag: `attributes` holds name, value, name, value, ..., null. Gives what is wrong with it,
-  /// or null. After a fault the object is of no more use.
-  const char* EnterElement(const char* name, const char* const* attributes);
+  /// Takes a start tag. Gives what is wrong with it, or null. After a fault the object is of no more use.
+  const char* EnterElement(const NameRange& name, const std::vector<AttributeRange>& attributes);
   void LeaveElement() noexcept;
 
   /// Declarations on all open elements together.
@@ -41,11 +42,11 @@ class NamespaceChecker final {
     std::size_t namespaceNumber;
   };
 
-  const char* TakeAttribute(std::string_view name, std::string_view value);
+  const char* TakeAttribute(const AttributeRange& attribute);
   void Declare(std::string_view prefix, std::string_view uri);
   std::size_t NumberOf(std::string_view uri) const noexcept;
   bool FindNamespaceNumber(std::string_view prefix, std::size_t& number) const noexcept;
-  bool HasDuplicate(const char* const* attributes);
+  bool HasDuplicate(const std::vector<AttributeRange>& attributes);
 
   std::vector<Binding> _bindings;  // The first _bindingCount are in scope, innermost last.
   std::size_t _bindingCount = 0;

@@ -21,31 +21,32 @@ Node::Node(NodeKind kind) noexcept
 
 Node::~Node() = default;
 
-Node* Node::GetFirstChild() const noexcept {
-  const bool canHaveChildren = _kind == ELEMENT_NODE || _kind == DOCUMENT_NODE;
-  return canHaveChildren ? static_cast<const ParentNode*>(this)->GetFirstChildNode() : nullptr;
-}
-
 ParentNode::ParentNode(NodeKind kind) noexcept
     : Node(kind), _firstChild(nullptr), _lastChild(nullptr), _childCount(0) {}
 
-// Children are released one by one by the outermost destructor, not each by its parent's: a deep tree would
-// need a deep stack. Those that wait are chained by their sibling pointers, which needs no memory.
+// Leaves are released here; children with children by the outermost destructor, one by one, and not each by
+// its parent's: a deep tree would need a deep stack. Those that wait are chained by their sibling pointers,
+// which needs no memory.
 ParentNode::~ParentNode() {
   thread_local Node* waiting = nullptr;
   thread_local bool isReleasing = false;
 
-  while (_firstChild != nullptr) {
-    Node* const child = _firstChild;
-    Unlink(child);
+  bool mustRelease = false;
+  for (Node* child = _firstChild; child != nullptr;) {
+    Node* const next = child->_nextSibling;
+    child->_parent = nullptr;
+    child->_previousSibling = nullptr;
+    child->_nextSibling = nullptr;
     if (child->GetFirstChild() == nullptr) {
       child->Release();
     } else {
       child->_nextSibling = waiting;
       waiting = child;
+      mustRelease = true;
     }
+    child = next;
   }
-  if (isReleasing) {
+  if (!mustRelease || isReleasing) {
     return;
   }
   isReleasing = true;
@@ -140,19 +141,15 @@ void ParentNode::Unlink(Node* child) noexcept {
 
 // ---- ElementNode
 
-ElementNode::ElementNode(const std::string& prefix, const std::string& localName)
+ElementNode::ElementNode(const Ref<const ElementName>& name)
     : ParentNode(ELEMENT_NODE),
-      _prefix(prefix),
-      _localName(localName),
       _line(0),
       _column(0),
-      _writtenWithEndTag(false) {}
+      _writtenWithEndTag(false),
+      _declaresNamespaces(false),
+      _name(name) {}
 
 ElementNode::~ElementNode() = default;
-
-std::string ElementNode::GetQualifiedName() const {
-  return _prefix.empty() ? _localName : _prefix + ":" + _localName;
-}
 
 std::set<std::string> ElementNode::GetAttributeNames() const {
   std::set<std::string> names;
@@ -213,7 +210,10 @@ const std::string* ElementNode::FindNamespaceUri(const std::string& prefix) cons
   }
   for (const Node* node = this; node != nullptr; node = node->GetParent()) {
     const ElementNode* const element = AsElement(node);
-    const std::string* const uri = element != nullptr ? FindDeclaration(element, prefix) : nullptr;
+    if (element == nullptr || !element->_declaresNamespaces) {
+      continue;
+    }
+    const std::string* const uri = FindDeclaration(element, prefix);
     if (uri != nullptr) {
       // An empty value takes the default namespace back (Namespaces in XML 1.0, section 6.2).
       return uri->empty() ? nullptr : uri;
@@ -253,7 +253,9 @@ void ElementNode::DefineAttribute(const std::string& name, const std::string& va
   RequireAttribute(name, value);
   std::string present;
   if (!GetAttribute(name, present)) {
+    std::string_view prefix;
     _attributes.push_back(Attribute{name, value});
+    _declaresNamespaces = _declaresNamespaces || IsNamespaceDeclaration(name, prefix);
     return;
   }
   if (present != value) {
@@ -264,7 +266,7 @@ void ElementNode::DefineAttribute(const std::string& name, const std::string& va
 ElementNode* ElementNode::FindChildElement(const std::string& localName) const noexcept {
   for (Node* child = GetFirstChildNode(); child != nullptr; child = child->GetNextSibling()) {
     ElementNode* const element = AsElement(child);
-    if (element != nullptr && element->_localName == localName) {
+    if (element != nullptr && element->GetLocalName() == localName) {
       return element;
     }
   }
@@ -275,11 +277,11 @@ ElementNode* ElementNode::FindChildElement(const std::string& namespaceUri,
                                            const std::string& localName) const noexcept {
   for (Node* child = GetFirstChildNode(); child != nullptr; child = child->GetNextSibling()) {
     ElementNode* const element = AsElement(child);
-    if (element == nullptr || element->_localName != localName) {
+    if (element == nullptr || element->GetLocalName() != localName) {
       continue;
     }
-    const std::string* const uri = element->FindNamespaceUri(element->_prefix);
-    if (uri != nullptr ? *uri == namespaceUri : namespaceUri.empty() && element->_prefix.empty()) {
+    const std::string* const uri = element->FindNamespaceUri(element->GetPrefix());
+    if (uri != nullptr ? *uri == namespaceUri : namespaceUri.empty() && element->GetPrefix().empty()) {
       return element;
     }
   }
@@ -334,27 +336,11 @@ void CreateElementNode(const std::string& prefix, const std::string& localName, 
   if (!IsNcName(localName) || !(prefix.empty() || IsNcName(prefix)) || prefix == "xmlns") {
     throw InvalidArgumentException("malformed element name");
   }
-  result = Ref<ElementNode>(new ElementNode(prefix, localName));
+  result = Ref<ElementNode>(new ElementNode(MakeRef<const ElementName>(prefix, localName)));
 }
 
 void CreateTextNode(Ref<TextNode>& result) {
   result = Ref<TextNode>(new TextNode());
-}
-
-ElementNode* AsElement(Node* node) noexcept {
-  return node != nullptr && node->GetKind() == ELEMENT_NODE ? static_cast<ElementNode*>(node) : nullptr;
-}
-
-const ElementNode* AsElement(const Node* node) noexcept {
-  return node != nullptr && node->GetKind() == ELEMENT_NODE ? static_cast<const ElementNode*>(node) : nullptr;
-}
-
-TextNode* AsText(Node* node) noexcept {
-  return node != nullptr && node->GetKind() == TEXT_NODE ? static_cast<TextNode*>(node) : nullptr;
-}
-
-const TextNode* AsText(const Node* node) noexcept {
-  return node != nullptr && node->GetKind() == TEXT_NODE ? static_cast<const TextNode*>(node) : nullptr;
 }
 
 Ref<Document> ViewAsDocument(const Ref<Object>& object) {

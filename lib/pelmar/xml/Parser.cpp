@@ -40,6 +40,10 @@ constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 
 // Grows with what comes, so that a reader of little takes little; reads one byte beyond the limit to know
 // that there is more.
+[[noreturn]] void ThrowTooLong() {
+  throw XMLParseException("more than " + std::to_string(kMaxDocumentBytes) + " bytes", 1, 1);
+}
+
 std::string Drain(Reader* reader) {
   constexpr std::size_t kFirstBufferBytes = 16384;
   std::string text;
@@ -51,7 +55,7 @@ std::string Drain(Reader* reader) {
     const std::size_t count = reader->Read(&text[used], text.size() - used);
     used += count;
     if (used > kMaxDocumentBytes) {
-      throw XMLParseException("more than " + std::to_string(kMaxDocumentBytes) + " bytes", 1, 1);
+      ThrowTooLong();
     }
     if (count == 0) {
       text.resize(used);
@@ -93,15 +97,30 @@ class XMLParserImpl final : public XMLParser {
     if (reader == nullptr) {
       throw InvalidArgumentException("the reader is null");
     }
+    BeUsed();
+    ParseText(Drain(reader), result);
+  }
+
+  void Parse(const std::string& text, Ref<Object>& result) override {
+    BeUsed();
+    if (text.size() > kMaxDocumentBytes) {
+      ThrowTooLong();
+    }
+    ParseText(text, result);
+  }
+
+ private:
+  void BeUsed() {
     if (std::exchange(_used, true)) {
       throw InvalidStateException("The XML parser was already used");
     }
-    const std::string text = Drain(reader);
+  }
+
+  void ParseText(const std::string& text, Ref<Object>& result) {
     ExpatSession(_handler.Get(), RequireUtf8Start(text)).Run();
     result = _handler->GetResult();
   }
 
- private:
   const Ref<XMLHandler> _handler;
   bool _used = false;
 };

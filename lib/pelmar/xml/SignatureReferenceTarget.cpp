@@ -45,7 +45,7 @@ bool MayBeIdName(const std::string& attributeName) {
 }
 
 bool MayHaveId(const ElementNode& element, const std::string& id) {
-  const std::vector<Attribute>& attributes = element.GetAttributes();
+  const AttributeList& attributes = element.GetAttributes();
   return std::any_of(attributes.begin(), attributes.end(), [&id](const Attribute& attribute) {
     return attribute.value == id && MayBeIdName(attribute.name);
   });

@@ -12,10 +12,6 @@ namespace Xml {
 
 namespace {
 
-bool Contains(const char* text, std::size_t size, char byte) noexcept {
-  return std::memchr(text, byte, size) != nullptr;
-}
-
 // Every byte of UTF-8 begins a character but those of the form 10xxxxxx.
 bool ContinuesCharacter(char byte) noexcept {
   return (static_cast<unsigned char>(byte) & 0xC0u) == 0x80u;
@@ -31,28 +27,54 @@ unsigned long CountContinuations(const char* text) noexcept {
   return static_cast<unsigned long>((marks * kLowBits) >> 56);
 }
 
-unsigned long CountCharacters(const char* text, std::size_t size) noexcept {
-  unsigned long continuations = 0;
+// Whether no byte has its highest bit set.
+bool IsAllAscii(std::string_view text) noexcept {
+  constexpr std::uint64_t kHighBits = 0x8080808080808080u;
+  std::uint64_t all = 0;
   std::size_t i = 0;
-  for (; size - i >= sizeof(std::uint64_t); i += sizeof(std::uint64_t)) {
-    continuations += CountContinuations(text + i);
+  for (; text.size() - i >= sizeof(all); i += sizeof(all)) {
+    std::uint64_t bytes = 0;
+    std::memcpy(&bytes, text.data() + i, sizeof(bytes));
+    all |= bytes;
   }
-  for (; i < size; ++i) {
-    continuations += ContinuesCharacter(text[i]) ? 1 : 0;
+  for (; i < text.size(); ++i) {
+    all |= static_cast<unsigned char>(text[i]);
   }
-  return size - continuations;
+  return (all & kHighBits) == 0;
 }
 
 }  // namespace
 
+TextPlace::TextPlace(std::string_view text) noexcept
+    : _at(text.data()),
+      _end(text.data() + text.size()),
+      _isAscii(IsAllAscii(text)),
+      _nextLineFeed(FindNext('\n')),
+      _nextReturn(FindNext('\r')) {}
+
 void TextPlace::AdvanceTo(const char* place) noexcept {
-  const std::size_t size = static_cast<std::size_t>(place - _at);
-  if (Contains(_at, size, '\n') || Contains(_at, size, '\r')) {
-    AdvanceOverLines(place);
+  const bool isOnThisLine = place <= _nextLineFeed && place <= _nextReturn;
+  if (isOnThisLine) {
+    _column += CountCharacters(_at, place);
   } else {
-    _column += CountCharacters(_at, size);
+    AdvanceOverLines(place);
   }
   _at = place;
+  if (_nextLineFeed < place) {
+    _nextLineFeed = FindNext('\n');
+  }
+  if (_nextReturn < place) {
+    _nextReturn = FindNext('\r');
+  }
+}
+
+// The end of the text when there is none.
+const char* TextPlace::FindNext(char byte) const noexcept {
+  if (_at == _end) {
+    return _end;
+  }
+  const void* const found = std::memchr(_at, byte, static_cast<std::size_t>(_end - _at));
+  return found != nullptr ? static_cast<const char*>(found) : _end;
 }
 
 void TextPlace::AdvanceOverLines(const char* place) noexcept {
@@ -64,7 +86,23 @@ void TextPlace::AdvanceOverLines(const char* place) noexcept {
       lineStart = p + 1;
     }
   }
-  _column = 1 + CountCharacters(lineStart, static_cast<std::size_t>(place - lineStart));
+  _column = 1 + CountCharacters(lineStart, place);
+}
+
+unsigned long TextPlace::CountCharacters(const char* first, const char* last) const noexcept {
+  const std::size_t size = static_cast<std::size_t>(last - first);
+  if (_isAscii) {
+    return size;
+  }
+  unsigned long continuations = 0;
+  std::size_t i = 0;
+  for (; size - i >= sizeof(std::uint64_t); i += sizeof(std::uint64_t)) {
+    continuations += CountContinuations(first + i);
+  }
+  for (; i < size; ++i) {
+    continuations += ContinuesCharacter(first[i]) ? 1 : 0;
+  }
+  return size - continuations;
 }
 
 }  // namespace Xml

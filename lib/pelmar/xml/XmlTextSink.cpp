@@ -108,11 +108,7 @@ void XmlTextSink::PutAttribute(std::string_view name, std::string_view value) {
 }
 
 void XmlTextSink::PutQualifiedName(const ElementNode* element) {
-  if (!element->GetPrefix().empty()) {
-    Put(element->GetPrefix());
-    Put(':');
-  }
-  Put(element->GetLocalName());
+  Put(element->GetQualifiedName());
 }
 
 void XmlTextSink::PutComment(const CommentNode* comment) {

@@ -16,6 +16,8 @@ namespace Quorlin {
 struct QUORLIN_API PrincipalId {
   /// Neither may be empty: that is a programming error and aborts the process.
   PrincipalId(const std::string& name, const std::string& domain);
+  /// The same, taking the texts over.
+  PrincipalId(std::string&& name, std::string&& domain);
 
   /// "{Name: alice; Domain:example.com}", the form used in log lines.
   std::string ToString() const;

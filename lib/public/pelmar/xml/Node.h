@@ -10,9 +10,11 @@
 #include <pelmar/Object.h>
 #include <pelmar/Ref.h>
 #include <pelmar/Writer.h>
+#include <pelmar/xml/NodeMemory.h>
 #include <pelmar/xml/QName.h>
 
 #include <cstddef>
+#include <cstdint>
 #include <set>
 #include <string>
 #include <vector>
@@ -30,16 +32,20 @@ enum NodeKind { DOCUMENT_NODE, ELEMENT_NODE, TEXT_NODE, COMMENT_NODE, PROCESSING
 /// Ownership: a parent owns its children; whoever holds a `Ref` to a node keeps that node and all below it
 /// alive, but not what is above: when the parent dies, the node has no parent any more.
 ///
-/// Threads: a tree that nobody changes may be read from several threads; a changing one belongs to one thread.
+/// Threads: a tree that nobody changes may be read from several threads; a changing one belongs to one
+/// thread.
 class PELMAR_API Node : public Object {
  public:
-  NodeKind GetKind() const noexcept { return _kind; }
+  NodeKind GetKind() const noexcept { return static_cast<NodeKind>(_kind); }
   /// Null when there is none.
   ParentNode* GetParent() const noexcept { return _parent; }
   Node* GetNextSibling() const noexcept { return _nextSibling; }
   Node* GetPreviousSibling() const noexcept { return _previousSibling; }
   /// Null for a node without children and for every node that cannot have any.
   Node* GetFirstChild() const noexcept;
+
+  static void* operator new(std::size_t size) { return AllocateNodeMemory(size); }
+  static void operator delete(void* memory, std::size_t size) noexcept { FreeNodeMemory(memory, size); }
 
  protected:
   explicit Node(NodeKind kind) noexcept;
@@ -48,7 +54,8 @@ class PELMAR_API Node : public Object {
  private:
   friend class ParentNode;
 
-  NodeKind _kind;
+  // A tree takes several times the memory of its text, so its nodes are packed: what is small stands first.
+  const unsigned char _kind;
   ParentNode* _parent;
   Node* _previousSibling;
   Node* _nextSibling;
@@ -82,8 +89,29 @@ class PELMAR_API ParentNode : public Node {
 
   Node* _firstChild;
   Node* _lastChild;
-  std::size_t _childCount;
+  std::uint32_t _childCount;
 };
+
+/// The name of an element as written. The elements of a parsed document share the names they have in common.
+class ElementName final : public Object {
+ public:
+  ElementName(const std::string& namePrefix, const std::string& name)
+      : prefix(namePrefix),
+        localName(name),
+        qualifiedName(namePrefix.empty() ? name : namePrefix + ":" + name) {}
+
+  const std::string prefix;  ///< Empty when there is none.
+  const std::string localName;
+  const std::string qualifiedName;  ///< "prefix:local", or the local name alone.
+
+ private:
+  ~ElementName() override {}
+};
+
+inline Node* Node::GetFirstChild() const noexcept {
+  const bool canHaveChildren = _kind == ELEMENT_NODE || _kind == DOCUMENT_NODE;
+  return canHaveChildren ? static_cast<const ParentNode*>(this)->GetFirstChildNode() : nullptr;
+}
 
 /// One attribute as written: its name with prefix, and its value. Namespace declarations are attributes like
 /// any other.
@@ -92,23 +120,25 @@ struct Attribute {
   std::string value;
 };
 
+/// In the order in which they were read or defined.
+typedef std::vector<Attribute, NodeAllocator<Attribute>> AttributeList;
+
 /// An element: a name as written, an ordered list of attributes, and children.
 class PELMAR_API ElementNode final : public ParentNode {
  public:
   /// The part of the name after the prefix.
-  const std::string& GetLocalName() const noexcept { return _localName; }
+  const std::string& GetLocalName() const noexcept { return _name->localName; }
   /// Empty when the name has no prefix.
-  const std::string& GetPrefix() const noexcept { return _prefix; }
+  const std::string& GetPrefix() const noexcept { return _name->prefix; }
   /// "prefix:local", or the local name alone.
-  std::string GetQualifiedName() const;
+  const std::string& GetQualifiedName() const noexcept { return _name->qualifiedName; }
 
   /// Line and column, counted from 1, of the element's "<" in the parsed text, the column in characters. Both
   /// 0 for an element that was not parsed.
   unsigned long GetLine() const noexcept { return _line; }
   unsigned long GetColumn() const noexcept { return _column; }
 
-  /// In the order in which they were read or defined.
-  const std::vector<Attribute>& GetAttributes() const noexcept { return _attributes; }
+  const AttributeList& GetAttributes() const noexcept { return _attributes; }
   /// The names as written, declarations included, sorted bytewise.
   std::set<std::string> GetAttributeNames() const;
 
@@ -147,15 +177,16 @@ class PELMAR_API ElementNode final : public ParentNode {
                                            Ref<ElementNode>& result);
   friend class XmlTextWriter;
 
-  ElementNode(const std::string& prefix, const std::string& localName);
+  explicit ElementNode(const Ref<const ElementName>& name);
   ~ElementNode() override;
 
-  std::string _prefix;
-  std::string _localName;
-  std::vector<Attribute> _attributes;
-  unsigned long _line;
-  unsigned long _column;
+  // No text that is parsed has more lines, or columns, than these can count.
+  std::uint32_t _line;
+  std::uint32_t _column;
   bool _writtenWithEndTag;
+  bool _declaresNamespaces;
+  Ref<const ElementName> _name;
+  AttributeList _attributes;
 };
 
 /// Character data. Adjacent runs of characters, references and CDATA sections are one text node after
@@ -223,10 +254,21 @@ PELMAR_API void CreateElementNode(const std::string& prefix, const std::string& 
 PELMAR_API void CreateTextNode(Ref<TextNode>& result);
 
 /// The node as an element or as a text; null when it is null or of another kind.
-PELMAR_API ElementNode* AsElement(Node* node) noexcept;
-PELMAR_API const ElementNode* AsElement(const Node* node) noexcept;
-PELMAR_API TextNode* AsText(Node* node) noexcept;
-PELMAR_API const TextNode* AsText(const Node* node) noexcept;
+inline ElementNode* AsElement(Node* node) noexcept {
+  return node != nullptr && node->GetKind() == ELEMENT_NODE ? static_cast<ElementNode*>(node) : nullptr;
+}
+
+inline const ElementNode* AsElement(const Node* node) noexcept {
+  return node != nullptr && node->GetKind() == ELEMENT_NODE ? static_cast<const ElementNode*>(node) : nullptr;
+}
+
+inline TextNode* AsText(Node* node) noexcept {
+  return node != nullptr && node->GetKind() == TEXT_NODE ? static_cast<TextNode*>(node) : nullptr;
+}
+
+inline const TextNode* AsText(const Node* node) noexcept {
+  return node != nullptr && node->GetKind() == TEXT_NODE ? static_cast<const TextNode*>(node) : nullptr;
+}
 
 /// The object as a document. Throws TypeMismatchException when it is null or something else.
 PELMAR_API Ref<Document> ViewAsDocument(const Ref<Object>& object);

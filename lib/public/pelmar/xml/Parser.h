@@ -54,15 +54,33 @@ enum ParserLimit : std::size_t {
   kMaxNamespaceUriBytes = 2048
 };
 
+/// Some characters of the text that is parsed, in UTF-8, followed by a zero byte.
+struct TextRange {
+  const char* data;
+  std::size_t size;
+};
+
+/// A name as written: "prefix:local", or the local part alone.
+struct NameRange {
+  TextRange text;
+  std::size_t localStart;  ///< Where the local part begins: after the colon, or at 0.
+};
+
+/// An attribute of a start tag: its name as written, and its normalised value.
+struct AttributeRange {
+  NameRange name;
+  TextRange value;
+};
+
 /// Takes the parser's events in document order. Names and values are UTF-8, normalised as XML 1.0 demands,
 /// and valid during the call. An exception thrown by a handler ends the parse and reaches the caller of
 /// `Parse`.
 class PELMAR_API XMLHandler : public Object {
  public:
-  /// `attributes` holds name, value, name, value, ..., null. `line` and `column` are those of the "<",
-  /// counted from 1.
-  virtual void StartElement(const char* name, const char* const* attributes, unsigned long line,
-                            unsigned long column) = 0;
+  /// `attributes` are `attributeCount` many, in document order. `line` and `column` are those of the "<",
+  /// counted from 1. All texts are valid during the call.
+  virtual void StartElement(const NameRange& name, const AttributeRange* attributes,
+                            std::size_t attributeCount, unsigned long line, unsigned long column) = 0;
   /// `emptyTag` tells that the element was written "<a/>".
   virtual void EndElement(bool emptyTag) = 0;
   virtual void Characters(const char* text, std::size_t size) = 0;
@@ -84,6 +102,8 @@ class PELMAR_API XMLParser : public Object {
   /// Parses everything `reader` yields and stores the handler's result. Throws XMLParseException; `result` is
   /// then unchanged.
   virtual void Parse(Reader* reader, Ref<Object>& result) = 0;
+  /// The same for a text that is in memory: it is read where it is, without a copy.
+  virtual void Parse(const std::string& text, Ref<Object>& result) = 0;
 
  protected:
   ~XMLParser() override;
