@@ -11,8 +11,8 @@ include(CMakePackageConfigHelpers)
 file(RELATIVE_PATH pc_to_prefix "/prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/prefix")
 string(REGEX REPLACE "/$" "" pc_to_prefix "${pc_to_prefix}")
 if(QUORLIN_LIBRARY_TYPE STREQUAL "STATIC")
-  set(pc_pelmar_requires "expat openssl >= 3.0 libcurl >= 7.87")
-  set(pc_gssapi_requires "krb5-gssapi >= 1.18")
+  set(pc_pelmar_requires "expat openssl >= ${QUORLIN_OpenSSL_MINIMUM} libcurl >= ${QUORLIN_CURL_MINIMUM}")
+  set(pc_gssapi_requires "krb5-gssapi >= ${QUORLIN_krb5-gssapi_MINIMUM}")
 endif()
 
 # quorlin_install_target(<target> <name> <package> <export> <component>): library, headers and .pc file of one library, and its

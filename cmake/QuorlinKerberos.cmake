@@ -15,15 +15,16 @@ endif()
 
 find_package(PkgConfig QUIET)
 if(PKG_CONFIG_FOUND)
-  pkg_check_modules(QUORLIN_KRB5_GSSAPI QUIET IMPORTED_TARGET krb5-gssapi>=1.18)
+  pkg_check_modules(QUORLIN_KRB5_GSSAPI QUIET IMPORTED_TARGET krb5-gssapi>=${QUORLIN_krb5-gssapi_MINIMUM})
 endif()
 if(QUORLIN_KRB5_GSSAPI_FOUND)
   set(QUORLIN_HAS_GSSAPI TRUE)
+  quorlin_check_version(krb5-gssapi "${QUORLIN_KRB5_GSSAPI_VERSION}")
   message(STATUS "Kerberos: found MIT Kerberos ${QUORLIN_KRB5_GSSAPI_VERSION}, libquorlin-gssapi is built.")
 elseif(QUORLIN_BUILD_GSSAPI STREQUAL "ON")
-  message(FATAL_ERROR "QUORLIN_BUILD_GSSAPI is ON, but pkg-config finds no MIT Kerberos 1.18 or newer (krb5-gssapi.pc; on "
+  message(FATAL_ERROR "QUORLIN_BUILD_GSSAPI is ON, but pkg-config finds no MIT Kerberos ${QUORLIN_krb5-gssapi_MINIMUM} or newer (krb5-gssapi.pc; on "
     "Debian in libkrb5-dev).")
 else()
-  message(STATUS "Kerberos: no MIT Kerberos 1.18 or newer (on Debian libkrb5-dev). libquorlin-gssapi and the Kerberos tests "
+  message(STATUS "Kerberos: no MIT Kerberos ${QUORLIN_krb5-gssapi_MINIMUM} or newer (on Debian libkrb5-dev). libquorlin-gssapi and the Kerberos tests "
     "are left out.")
 endif()
