@@ -6,6 +6,7 @@
 #include "quorlin/Descriptor.h"
 #include "quorlin/Failure.h"
 
+#include <pelmar/SecretText.h>
 #include <pelmar/crypto/CryptoException.h>
 
 #include <fcntl.h>
@@ -27,6 +28,12 @@ namespace {
 [[noreturn]] void Refuse(const std::string& what, const std::string& path, int error) {
   throw UsageException("cannot " + what + " " + path + ": " + std::strerror(error));
 }
+
+/// What a file is read into. It may be a key.
+struct FileBlock {
+  ~FileBlock() { Pelmar::Wipe(bytes.data(), bytes.size()); }
+  std::array<char, 65536> bytes;
+};
 
 int OpenForReading(const std::string& path) {
   return path == "-" ? STDIN_FILENO : open(path.c_str(), O_RDONLY | O_CLOEXEC);
@@ -76,31 +83,41 @@ std::string GuessWhatElse(const std::string& content) {
 
 }  // namespace
 
-std::string ReadFileUpTo(const std::string& path, std::size_t maxBytes) {
+void ReadFileInto(const std::string& path, std::size_t maxBytes, Pelmar::Writer& writer) {
   const Descriptor file(OpenForReading(path));
   if (file.Get() < 0) {
     Refuse("read", path, errno);
   }
-  std::string content;
-  std::array<char, 65536> buffer;
-  while (content.size() < maxBytes) {
-    const ssize_t count = read(file.Get(), buffer.data(), std::min(buffer.size(), maxBytes - content.size()));
+  FileBlock block;
+  for (std::size_t left = maxBytes; left > 0;) {
+    const ssize_t count = read(file.Get(), block.bytes.data(), std::min(block.bytes.size(), left));
     if (count < 0 && errno != EINTR) {
       Refuse("read", path, errno);
     }
     if (count == 0) {
       break;
     }
-    content.append(buffer.data(), count > 0 ? static_cast<std::size_t>(count) : 0);
+    const std::size_t size = count > 0 ? static_cast<std::size_t>(count) : 0;
+    writer.Write(block.bytes.data(), size);
+    left -= size;
   }
-  return content;
+}
+
+void RequireSize(const std::string& path, std::size_t size, std::size_t maxBytes) {
+  if (size > maxBytes) {
+    throw UsageException(path + " is larger than " + std::to_string(maxBytes) + " bytes");
+  }
+}
+
+std::string ReadFileUpTo(const std::string& path, std::size_t maxBytes) {
+  const Pelmar::Ref<Pelmar::StringWriter> content = Pelmar::CreateStringWriter();
+  ReadFileInto(path, maxBytes, *content);
+  return content->GetText();
 }
 
 std::string ReadFile(const std::string& path, std::size_t maxBytes) {
   std::string content = ReadFileUpTo(path, maxBytes + 1);
-  if (content.size() > maxBytes) {
-    throw UsageException(path + " is larger than " + std::to_string(maxBytes) + " bytes");
-  }
+  RequireSize(path, content.size(), maxBytes);
   return content;
 }
 

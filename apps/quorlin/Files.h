@@ -7,6 +7,7 @@
 #define QUORLIN_CLI_FILES_H
 
 #include <pelmar/Ref.h>
+#include <pelmar/Writer.h>
 #include <pelmar/crypto/Certificate.h>
 
 #include <cstddef>
@@ -22,6 +23,13 @@ constexpr std::size_t kMaxFileBytes = 4 * 1024 * 1024;
 /// The file's bytes; "-" is standard input. Throws UsageException when it cannot be read or is larger than
 /// `maxBytes`.
 std::string ReadFile(const std::string& path, std::size_t maxBytes = kMaxFileBytes);
+
+/// Hands the first `maxBytes` bytes of the file to `writer`, or fewer when it is shorter, and keeps none of
+/// them. Throws UsageException when it cannot be read.
+void ReadFileInto(const std::string& path, std::size_t maxBytes, Pelmar::Writer& writer);
+
+/// Throws the UsageException of a file that is larger than `maxBytes`.
+void RequireSize(const std::string& path, std::size_t size, std::size_t maxBytes);
 
 /// The first `maxBytes` bytes of the file, or fewer when it is shorter. Throws UsageException when it cannot
 /// be read.

@@ -32,7 +32,7 @@ Pelmar::Ref<Pelmar::Ssl::SSLContext> MakeSslContext(const ServiceOptions& option
 }
 
 Pelmar::Ref<const Pelmar::Crypto::PrivateKey> ReadKey(const HolderOfKeyOptions& options) {
-  const Secret pem(ReadFile(options.keyFile));
+  const Secret pem = ReadKeyFile(options.keyFile);
   try {
     if (options.keyPasswordFile.empty()) {
       return Pelmar::Crypto::CreatePrivateKeyFromPem(pem.Reveal());

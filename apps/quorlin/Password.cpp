@@ -5,6 +5,7 @@
 
 #include "quorlin/Descriptor.h"
 #include "quorlin/Failure.h"
+#include "quorlin/Files.h"
 #include "quorlin/Terminal.h"
 
 #include <fcntl.h>
@@ -35,7 +36,7 @@ class PasswordBuffer final {
   PasswordBuffer() = default;
   PasswordBuffer(const PasswordBuffer&) = delete;
   PasswordBuffer& operator=(const PasswordBuffer&) = delete;
-  ~PasswordBuffer() { OPENSSL_cleanse(_bytes.data(), _bytes.size()); }
+  ~PasswordBuffer() { Pelmar::Wipe(_bytes.data(), _bytes.size()); }
 
   /// Reads once; false at the end of the stream or on an error other than an interruption.
   bool ReadFrom(int descriptor) {
@@ -62,7 +63,7 @@ class PasswordBuffer final {
     if (size == 0) {
       throw UsageException("the password is empty");
     }
-    return Secret(_bytes.data(), size);
+    return Secret(std::string(_bytes.data(), size));
   }
 
  private:
@@ -196,6 +197,13 @@ Secret ReadSecretFile(const std::string& path) {
     throw UsageException("cannot read " + path + ": " + std::strerror(errno));
   }
   return ReadToEnd(file.Get());
+}
+
+Secret ReadKeyFile(const std::string& path) {
+  const Pelmar::Ref<Pelmar::StringWriter> content = Pelmar::CreateSecretStringWriter();
+  ReadFileInto(path, kMaxFileBytes + 1, *content);
+  RequireSize(path, content->GetText().size(), kMaxFileBytes);
+  return Secret(content->GetText());
 }
 
 }  // namespace Cli

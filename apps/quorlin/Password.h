@@ -37,6 +37,9 @@ Secret ReadPassword(const PasswordOptions& options, const std::string& userName)
 /// A password or pass phrase from a file, without one line end. Throws UsageException.
 Secret ReadSecretFile(const std::string& path);
 
+/// A file with a private key in it; "-" is standard input. Throws what ReadFile throws.
+Secret ReadKeyFile(const std::string& path);
+
 }  // namespace Cli
 
 #endif  // QUORLIN_CLI_PASSWORD_H

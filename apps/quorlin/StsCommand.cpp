@@ -7,12 +7,12 @@
 #include "quorlin/Files.h"
 #include "quorlin/Kerberos.h"
 #include "quorlin/Outcome.h"
+#include "quorlin/Password.h"
 #include "quorlin/Signals.h"
 #include "quorlin/StsFiles.h"
 #include "quorlin/TemporaryDirectory.h"
 #include "quorlin/TokenOutput.h"
 
-#include "devsts/Secret.h"
 #include "devsts/Service.h"
 #include "devsts/ToyNegotiation.h"
 
@@ -78,7 +78,7 @@ DevSts::Directory ReadDirectory(const std::string& file) {
 
 DevSts::Identity ReadSigner(const StsArguments& arguments) {
   try {
-    const DevSts::Secret key(ReadFile(arguments.signingKeyFile));
+    const Secret key = ReadKeyFile(arguments.signingKeyFile);
     return DevSts::ReadIdentity(key.Reveal(), ReadFile(arguments.signingCertificateFile));
   } catch (const std::invalid_argument& e) {
     throw UsageException(e.what());

@@ -3,6 +3,7 @@
 
 #include "quorlin/CommandTree.h"
 #include "quorlin/Commands.h"
+#include "quorlin/CoreDumps.h"
 #include "quorlin/ExitCode.h"
 #include "quorlin/Terminal.h"
 
@@ -110,6 +111,10 @@ int Run(int argumentCount, char** arguments) {
 
 int main(int argumentCount, char** arguments) {
   try {
+    if (!Cli::ForbidCoreDumps()) {
+      // Said, but no reason to do nothing at all.
+      std::cerr << "quorlin: warning: core dumps cannot be switched off, and would hold passwords and keys\n";
+    }
     return Run(argumentCount, arguments);
   } catch (const std::exception& e) {
     std::cerr << "quorlin: " << Cli::MakePrintable(e.what()) << "\n";

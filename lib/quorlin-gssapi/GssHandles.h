@@ -6,6 +6,8 @@
 #ifndef QUORLIN_GSSAPI_GSSHANDLES_H
 #define QUORLIN_GSSAPI_GSSHANDLES_H
 
+#include <pelmar/SecretText.h>
+
 #include <gssapi/gssapi.h>
 
 #include <string>
@@ -48,13 +50,14 @@ using GssName = GssHandle<gss_name_t, gss_release_name>;
 using GssCredential = GssHandle<gss_cred_id_t, gss_release_cred>;
 using GssContext = GssHandle<gss_ctx_id_t, DeleteGssContext>;
 
-/// Owns the bytes that a GSS-API call gives back.
+/// Owns the bytes that a GSS-API call gives back, and wipes them: they may be what proves who the user is.
 class GssBuffer final {
  public:
   GssBuffer() = default;
   GssBuffer(const GssBuffer&) = delete;
   GssBuffer& operator=(const GssBuffer&) = delete;
   ~GssBuffer() {
+    Pelmar::Wipe(_buffer.value, _buffer.length);
     OM_uint32 ignored = 0;
     gss_release_buffer(&ignored, &_buffer);
   }

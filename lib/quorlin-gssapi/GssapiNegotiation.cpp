@@ -8,6 +8,7 @@
 #include "quorlin-gssapi/GssStatus.h"
 
 #include <pelmar/Exception.h>
+#include <pelmar/SecretText.h>
 #include <quorlin/Exceptions.h>
 
 #include <boost/make_shared.hpp>
@@ -30,6 +31,11 @@ using InternalApi::IsFaultOf;
 
 // SPNEGO protects its choice of mechanism by an integrity code (RFC 4178, section 5).
 constexpr OM_uint32 kFlags = GSS_C_MUTUAL_FLAG | GSS_C_INTEG_FLAG;
+
+void WipeAndDelete(Leg* leg) {
+  Pelmar::Wipe(*leg);
+  delete leg;
+}
 
 void RequireNoNul(const std::string& text) {
   if (text.find('\0') != std::string::npos) {
@@ -126,7 +132,7 @@ boost::shared_ptr<Leg> GssapiNegotiationHandlerImpl::Step(const Leg& serverLeg) 
   if (isComplete && (flags & GSS_C_MUTUAL_FLAG) == 0) {
     throw SsoException(DescribeTarget() + " failed: the service did not prove its identity");
   }
-  const boost::shared_ptr<Leg> leg = boost::make_shared<Leg>(output.begin(), output.end());
+  const boost::shared_ptr<Leg> leg(new Leg(output.begin(), output.end()), &WipeAndDelete);
   if (!isComplete && leg->empty()) {
     throw SsoException(DescribeTarget() + " failed: it is not complete, and there is nothing left to say");
   }

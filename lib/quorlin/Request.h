@@ -6,12 +6,17 @@
 #ifndef QUORLIN_REQUEST_H
 #define QUORLIN_REQUEST_H
 
+#include <pelmar/SecretText.h>
+
 #include <string>
 
 namespace Quorlin {
 
-/// One SOAP 1.1 request as it goes over the wire. A plain value.
+/// One SOAP 1.1 request as it goes over the wire. A plain value, but for its body, which may hold a password
+/// and is wiped in the end.
 struct Request {
+  ~Request() { Pelmar::Wipe(body); }
+
   /// The actions (WS-Trust 1.3, sections 4 to 8).
   static const char* const VALIDATE;
   static const char* const RENEW;

@@ -204,7 +204,7 @@ TokenSpec::Confirmation ConfOverrideWithDelegate(TokenSpec spec) {
 std::string SerializeToXML(const XMLBuilderPtr& builder) {
   Ref<Pelmar::Xml::ElementNode> element;
   builder->build(element);
-  const Ref<Pelmar::StringWriter> writer = Pelmar::CreateStringWriter();
+  const Ref<Pelmar::StringWriter> writer = Pelmar::CreateSecretStringWriter();
   element->WriteXml(writer.Get());
   return writer->GetText();
 }

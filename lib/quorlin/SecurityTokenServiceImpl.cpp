@@ -5,6 +5,7 @@
 
 #include <pelmar/Exception.h>
 #include <pelmar/MessageFormatter.h>
+#include <pelmar/SecretText.h>
 #include <pelmar/StringUtil.h>
 #include <pelmar/Verify.h>
 #include <pelmar/service/Logger.h>
@@ -209,7 +210,9 @@ boost::shared_ptr<const SamlToken> SecurityTokenServiceImpl::RenewToken(const Sa
 
 void SecurityTokenServiceImpl::AcquireTokenAsync(const std::string& userName, const std::string& password,
                                                  const TokenSpec& spec, const TokenCompletion& done) const {
-  SyncToAsyncCall(boost::bind(&SecurityTokenService::AcquireToken, Copy(), userName, password, spec), done);
+  SyncToAsyncCall(
+      boost::bind(&SecurityTokenService::AcquireToken, Copy(), userName, Pelmar::SecretText(password), spec),
+      done);
 }
 
 void SecurityTokenServiceImpl::AcquireTokenByGssAsync(const TokenSpec& spec,

@@ -40,11 +40,11 @@ void ElementBuilderImpl::build(Ref<ElementNode>& result) const {
 }
 
 TextElementBuilderImpl::TextElementBuilderImpl(std::string prefix, std::string localName,
-                                               AttributeMap attributes, std::string text)
+                                               AttributeMap attributes, const std::string& text)
     : _prefix(std::move(prefix)),
       _localName(std::move(localName)),
       _attributes(std::move(attributes)),
-      _text(std::move(text)) {}
+      _text(text) {}
 
 void TextElementBuilderImpl::build(Ref<ElementNode>& result) const {
   BuildElement(_prefix, _localName, _attributes, result);
@@ -91,14 +91,14 @@ XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName, Attribut
                                                 std::move(attributes));
 }
 
-XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, std::string text) {
-  return TextElementBuilder(std::move(prefix), std::move(localName), AttributeMap(), std::move(text));
+XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, const std::string& text) {
+  return TextElementBuilder(std::move(prefix), std::move(localName), AttributeMap(), text);
 }
 
 XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, AttributeMap attributes,
-                                 std::string text) {
+                                 const std::string& text) {
   return boost::make_shared<TextElementBuilderImpl>(std::move(prefix), std::move(localName),
-                                                    std::move(attributes), std::move(text));
+                                                    std::move(attributes), text);
 }
 
 XMLBuilderPtr CompositeBuilder(const XMLBuilderPtr& rootBuilder,

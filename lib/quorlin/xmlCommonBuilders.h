@@ -12,6 +12,7 @@
 #define QUORLIN_XMLCOMMONBUILDERS_H
 
 #include <pelmar/Ref.h>
+#include <pelmar/SecretText.h>
 #include <pelmar/xml/Node.h>
 #include <quorlin/SamlToken.h>
 
@@ -54,18 +55,19 @@ class ElementBuilderImpl final : public XMLBaseBuilder {
   AttributeMap _attributes;
 };
 
-/// An element with one text, which may be empty.
+/// An element with one text, which may be empty. The text may be a password: it is copied from the caller's
+/// string into this object alone, and wiped with it.
 class TextElementBuilderImpl final : public XMLBaseBuilder {
  public:
   TextElementBuilderImpl(std::string prefix, std::string localName, AttributeMap attributes,
-                         std::string text);
+                         const std::string& text);
   void build(Pelmar::Ref<Pelmar::Xml::ElementNode>& result) const override;
 
  private:
   std::string _prefix;
   std::string _localName;
   AttributeMap _attributes;
-  std::string _text;
+  Pelmar::SecretText _text;
 };
 
 /// An element that exists already. It is handed out itself, not as a copy, so such a builder is built once
@@ -97,9 +99,9 @@ class XMLCompositeBuilder final : public XMLBaseBuilder {
 
 XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName);
 XMLBuilderPtr ElementBuilder(std::string prefix, std::string localName, AttributeMap attributes);
-XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, std::string text);
+XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, const std::string& text);
 XMLBuilderPtr TextElementBuilder(std::string prefix, std::string localName, AttributeMap attributes,
-                                 std::string text);
+                                 const std::string& text);
 
 /// A composite of `rootBuilder` and `childBuilders`.
 XMLBuilderPtr CompositeBuilder(const XMLBuilderPtr& rootBuilder,

@@ -101,6 +101,10 @@ XMLBodyBuilderInitialSPNego::XMLBodyBuilderInitialSPNego(SamlToken::Confirmation
                                                          const std::vector<unsigned char>& leg)
     : _confirmation(confirmation), _spec(spec), _leg(leg) {}
 
+XMLBodyBuilderInitialSPNego::~XMLBodyBuilderInitialSPNego() {
+  Pelmar::Wipe(_leg);
+}
+
 void XMLBodyBuilderInitialSPNego::build(Ref<ElementNode>& result) const {
   CompositeBuilder(AcquireSecurityTokenBuilder(_confirmation, _spec), {WstSPNegoBinExchangeBuilder(_leg)})
       ->build(result);
@@ -110,6 +114,10 @@ void XMLBodyBuilderInitialSPNego::build(Ref<ElementNode>& result) const {
 XMLBodyBuilderContinuedSPNego::XMLBodyBuilderContinuedSPNego(const std::string& contextId,
                                                              const std::vector<unsigned char>& leg)
     : _contextId(contextId), _leg(leg) {}
+
+XMLBodyBuilderContinuedSPNego::~XMLBodyBuilderContinuedSPNego() {
+  Pelmar::Wipe(_leg);
+}
 
 void XMLBodyBuilderContinuedSPNego::build(Ref<ElementNode>& result) const {
   CompositeBuilder(ElementBuilder("wst", "RequestSecurityTokenResponse"), {WstSPNegoBinExchangeBuilder(_leg)})
@@ -196,9 +204,9 @@ XMLBuilderPtr WsseUsernameTokenBuilder(const std::string& userName, const std::s
 }
 
 XMLBuilderPtr WstSPNegoBinExchangeBuilder(const std::vector<unsigned char>& leg) {
+  const Pelmar::SecretText text(Pelmar::StringUtil::Base64Encode(leg));
   return TextElementBuilder("wst", "BinaryExchange",
-                            {{"EncodingType", kWssBase64}, {"ValueType", kSpnegoType}},
-                            Pelmar::StringUtil::Base64Encode(leg));
+                            {{"EncodingType", kWssBase64}, {"ValueType", kSpnegoType}}, text);
 }
 
 }  // namespace Quorlin

@@ -43,6 +43,8 @@ class XMLBodyBuilderInitialSPNego final : public XMLBaseBuilder {
  public:
   XMLBodyBuilderInitialSPNego(SamlToken::ConfirmationType confirmation, const TokenSpec& spec,
                               const std::vector<unsigned char>& leg);
+  /// Wipes its copy of the leg.
+  ~XMLBodyBuilderInitialSPNego();
   void build(Pelmar::Ref<Pelmar::Xml::ElementNode>& result) const override;
 
  private:
@@ -55,6 +57,8 @@ class XMLBodyBuilderInitialSPNego final : public XMLBaseBuilder {
 class XMLBodyBuilderContinuedSPNego final : public XMLBaseBuilder {
  public:
   XMLBodyBuilderContinuedSPNego(const std::string& contextId, const std::vector<unsigned char>& leg);
+  /// Wipes its copy of the leg.
+  ~XMLBodyBuilderContinuedSPNego();
   void build(Pelmar::Ref<Pelmar::Xml::ElementNode>& result) const override;
 
  private:

@@ -29,7 +29,7 @@ Ref<Exchange> MakeExchange(int port) {
   const Ref<const ConnectionSpecImpl> spec =
       ToConnectionSpecImpl(CreateTCPConnectionSpec("127.0.0.1", port).Get());
   const AgentParts agent{~0ULL, spec, Pelmar::MakeRef<CookieStoreImpl>()};
-  return Exchange::Create(agent, RequestParts{METHOD_GET, "/", {}, ""},
+  return Exchange::Create(agent, RequestParts{METHOD_GET, "/", {}, {}},
                           [](const Pelmar::Exception*, ClientResponse*, PendingRequestItem*) {});
 }
 

@@ -84,7 +84,7 @@ class Client final {
     _now = std::time(nullptr) + seconds;
     const AgentParts agent{++_lastAgent, _spec, Pelmar::MakeRef<CookieStoreImpl>()};
     const Ref<Exchange> exchange =
-        Exchange::Create(agent, RequestParts{METHOD_GET, "/", {}, ""},
+        Exchange::Create(agent, RequestParts{METHOD_GET, "/", {}, {}},
                          [](const Pelmar::Exception*, ClientResponse*, PendingRequestItem*) {});
     _loop.Submit(exchange);
     exchange->Wait(-1);

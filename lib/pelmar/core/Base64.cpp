@@ -110,14 +110,15 @@ void RemovePadding(std::vector<unsigned char>& bytes, std::size_t padding) {
 
 std::string Base64Encode(const std::vector<unsigned char>& bytes) {
   const std::size_t size = (bytes.size() + kBytesPerGroup - 1) / kBytesPerGroup * kLettersPerGroup;
-  std::vector<unsigned char> letters(size + 1);  // EVP_EncodeBlock closes every piece with a NUL.
+  std::string letters(size + 1, '\0');  // EVP_EncodeBlock closes every piece with a NUL.
   constexpr std::size_t kPiece = kMaxGroupsPerCall * kBytesPerGroup;
   for (std::size_t done = 0; done < bytes.size(); done += kPiece) {
     const std::size_t count = std::min(kPiece, bytes.size() - done);
-    EVP_EncodeBlock(letters.data() + done / kBytesPerGroup * kLettersPerGroup, bytes.data() + done,
-                    static_cast<int>(count));
+    EVP_EncodeBlock(reinterpret_cast<unsigned char*>(&letters[done / kBytesPerGroup * kLettersPerGroup]),
+                    bytes.data() + done, static_cast<int>(count));
   }
-  return std::string(reinterpret_cast<const char*>(letters.data()), size);
+  letters.resize(size);
+  return letters;
 }
 
 std::vector<unsigned char> Base64Decode(const std::string& text) {

@@ -3,6 +3,11 @@
 
 #include <pelmar/Writer.h>
 
+#include <pelmar/SecretText.h>
+
+#include <algorithm>
+#include <utility>
+
 namespace Pelmar {
 
 Writer::~Writer() = default;
@@ -20,10 +25,39 @@ class StringWriterImpl final : public StringWriter {
   std::string _text;
 };
 
+/// Grows by itself, since a string would leave what it has outgrown as it is.
+class SecretStringWriterImpl final : public StringWriter {
+ public:
+  void Write(const char* data, std::size_t size) override {
+    if (size > _text.capacity() - _text.size()) {
+      Grow(size);
+    }
+    _text.append(data, size);
+  }
+  const std::string& GetText() const override { return _text; }
+
+ private:
+  ~SecretStringWriterImpl() override { Wipe(_text); }
+
+  void Grow(std::size_t size) {
+    std::string larger;
+    larger.reserve(std::max(_text.size() + size, 2 * _text.capacity()));
+    larger.append(_text);
+    Wipe(_text);
+    _text = std::move(larger);
+  }
+
+  std::string _text;
+};
+
 }  // namespace
 
 Ref<StringWriter> CreateStringWriter() {
   return MakeRef<StringWriterImpl>();
+}
+
+Ref<StringWriter> CreateSecretStringWriter() {
+  return MakeRef<SecretStringWriterImpl>();
 }
 
 }  // namespace Pelmar

@@ -69,7 +69,7 @@ void RequireHeaderValue(const std::string& name, const std::string& value) {
 ClientRequest::~ClientRequest() = default;
 
 ClientRequestImpl::ClientRequestImpl(Method method, const std::string& path)
-    : _parts{method, path, {}, std::string()}, _body(CreateStringWriter()) {}
+    : _parts{method, path, {}, SecretText()}, _body(CreateSecretStringWriter()) {}
 
 ClientRequestImpl::~ClientRequestImpl() = default;
 

@@ -6,6 +6,7 @@
 #ifndef PELMAR_HTTP_CLIENTREQUESTIMPL_H
 #define PELMAR_HTTP_CLIENTREQUESTIMPL_H
 
+#include <pelmar/SecretText.h>
 #include <pelmar/http/Client.h>
 
 #include <string>
@@ -20,7 +21,7 @@ struct RequestParts {
   Method method;
   std::string path;
   std::vector<std::pair<std::string, std::string>> headers;
-  std::string body;
+  SecretText body;  ///< Logins are among what is posted.
 };
 
 class ClientRequestImpl final : public ClientRequest {

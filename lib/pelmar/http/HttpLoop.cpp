@@ -3,6 +3,8 @@
 
 #include "pelmar/http/HttpLoop.h"
 
+#include "pelmar/http/CurlMemory.h"
+
 #include <pelmar/http/HttpException.h>
 #include <pelmar/system/ThreadPool.h>
 
@@ -149,7 +151,7 @@ bool HttpLoop::Post(Command command) {
 
 /// Called with the lock held.
 void HttpLoop::StartThread() {
-  if (curl_global_init(CURL_GLOBAL_DEFAULT) != CURLE_OK) {
+  if (!InitializeCurl()) {
     throw HttpException("The HTTP engine cannot be set up");
   }
   try {

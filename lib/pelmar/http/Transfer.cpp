@@ -122,8 +122,8 @@ void Transfer::SetRequest() {
   const RequestParts& request = _exchange->GetRequest();
   if (request.method == METHOD_POST) {
     Set(CURLOPT_POST, kOn);
-    Set(CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(request.body.size()));
-    Set(CURLOPT_POSTFIELDS, request.body.c_str());
+    Set(CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(request.body.Reveal().size()));
+    Set(CURLOPT_POSTFIELDS, request.body.Reveal().c_str());
   } else {
     Set(CURLOPT_HTTPGET, kOn);
   }

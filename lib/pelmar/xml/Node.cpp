@@ -7,6 +7,7 @@
 #include "pelmar/xml/XmlTextWriter.h"
 
 #include <pelmar/Exception.h>
+#include <pelmar/SecretText.h>
 #include <pelmar/StringUtil.h>
 
 #include <utility>
@@ -297,14 +298,22 @@ void ElementNode::WriteXml(Writer* writer) const {
 
 // ---- The other nodes
 
-TextNode::TextNode() : Node(TEXT_NODE) {}
+TextNode::TextNode() : Node(TEXT_NODE), _wasSet(false) {}
 
-TextNode::~TextNode() = default;
+TextNode::~TextNode() {
+  if (_wasSet) {
+    Wipe(_text);
+  }
+}
 
 void TextNode::SetText(const std::string& text) {
   if (!StringUtil::IsXmlText(text)) {
     throw InvalidArgumentException("the text of a node is not XML text");
   }
+  if (_wasSet && &text != &_text) {
+    Wipe(_text);
+  }
+  _wasSet = true;
   _text = text;
 }
 

@@ -3,6 +3,9 @@
 
 #include "pelmar/xml/XmlTextSink.h"
 
+#include <pelmar/SecretText.h>
+
+#include <algorithm>
 #include <array>
 
 namespace Pelmar {
@@ -69,6 +72,10 @@ std::size_t CountPlain(std::string_view text, const Marks& marks) noexcept {
 
 }  // namespace
 
+XmlTextSink::~XmlTextSink() {
+  Wipe(_buffer.data(), std::max(_mostUsed, _used));
+}
+
 void XmlTextSink::PutBeyondBuffer(std::string_view bytes) {
   Flush();
   if (bytes.size() > _buffer.size()) {
@@ -130,6 +137,7 @@ void XmlTextSink::PutProcessingInstruction(const ProcessingInstructionNode* inst
 void XmlTextSink::Flush() {
   if (_used > 0) {
     _writer->Write(_buffer.data(), _used);
+    _mostUsed = std::max(_mostUsed, _used);
     _used = 0;
   }
 }

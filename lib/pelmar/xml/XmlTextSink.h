@@ -24,6 +24,8 @@ class XmlTextSink final {
   explicit XmlTextSink(Writer* writer) noexcept : _writer(writer) {}
   XmlTextSink(const XmlTextSink&) = delete;
   XmlTextSink& operator=(const XmlTextSink&) = delete;
+  /// Wipes the buffer: a request passes through it with its password.
+  ~XmlTextSink();
 
   /// Markup and names: bytes that go out as they are.
   void Put(std::string_view bytes) {
@@ -64,6 +66,7 @@ class XmlTextSink final {
 
   Writer* _writer;
   std::size_t _used = 0;
+  std::size_t _mostUsed = 0;
   std::array<char, 4096> _buffer;
 };
 

@@ -35,6 +35,9 @@ class PELMAR_API StringWriter : public Writer {
 
 PELMAR_API Ref<StringWriter> CreateStringWriter();
 
+/// The same for a text with secrets in it: whatever memory it had is wiped when it is given back.
+PELMAR_API Ref<StringWriter> CreateSecretStringWriter();
+
 }  // namespace Pelmar
 
 #endif  // PELMAR_WRITER_H

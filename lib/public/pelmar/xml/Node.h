@@ -190,7 +190,8 @@ class PELMAR_API ElementNode final : public ParentNode {
 };
 
 /// Character data. Adjacent runs of characters, references and CDATA sections are one text node after
-/// parsing.
+/// parsing. A text that was set, and so may be a password, is wiped from memory when it is set anew or the
+/// node goes; a parsed one is not.
 class PELMAR_API TextNode final : public Node {
  public:
   const std::string& GetText() const noexcept { return _text; }
@@ -205,6 +206,7 @@ class PELMAR_API TextNode final : public Node {
   ~TextNode() override;
 
   std::string _text;
+  bool _wasSet;
 };
 
 class PELMAR_API CommentNode final : public Node {
