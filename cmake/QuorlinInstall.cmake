@@ -72,4 +72,5 @@ if(TARGET quorlin)
   install(FILES "${help_dir}/quorlin.fish"
     DESTINATION "${CMAKE_INSTALL_DATADIR}/fish/vendor_completions.d" COMPONENT tools)
 endif()
-install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT development)
+include(QuorlinSbom)
+install(FILES "${PROJECT_SOURCE_DIR}/LICENSE" "${PROJECT_SOURCE_DIR}/SECURITY.md" DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT development)
