@@ -21,6 +21,7 @@ OTHER = re.compile(r"\bVerify\(|VerifyFailed\(|PanicNotReached|static_assert|#in
 # Literals that read like words and are neither message nor log line.
 NO_MESSAGES = {
     "Accept-Encoding: identity",
+    "Proxy-Connection:",
 }
 
 

@@ -16,6 +16,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <future>
+#include <memory>
 #include <stdexcept>
 #include <string>
 
@@ -28,7 +29,8 @@ using Pelmar::Ref;
 Ref<Exchange> MakeExchange(int port) {
   const Ref<const ConnectionSpecImpl> spec =
       ToConnectionSpecImpl(CreateTCPConnectionSpec("127.0.0.1", port).Get());
-  const AgentParts agent{~0ULL, spec, Pelmar::MakeRef<CookieStoreImpl>()};
+  const AgentParts agent{~0ULL, spec, Pelmar::MakeRef<CookieStoreImpl>(),
+                         std::make_shared<const AgentOptions>(ClientOptions())};
   return Exchange::Create(agent, RequestParts{METHOD_GET, "/", {}, {}},
                           [](const Pelmar::Exception*, ClientResponse*, PendingRequestItem*) {});
 }

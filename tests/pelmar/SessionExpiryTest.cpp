@@ -19,6 +19,7 @@
 #include <atomic>
 #include <cstdint>
 #include <ctime>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -82,7 +83,8 @@ class Client final {
   /// Whether an exchange, `seconds` from now by the clock of the sessions, resumed one.
   bool Resumes(long long seconds) {
     _now = std::time(nullptr) + seconds;
-    const AgentParts agent{++_lastAgent, _spec, Pelmar::MakeRef<CookieStoreImpl>()};
+    const AgentParts agent{++_lastAgent, _spec, Pelmar::MakeRef<CookieStoreImpl>(),
+                           std::make_shared<const AgentOptions>(ClientOptions())};
     const Ref<Exchange> exchange =
         Exchange::Create(agent, RequestParts{METHOD_GET, "/", {}, {}},
                          [](const Pelmar::Exception*, ClientResponse*, PendingRequestItem*) {});

@@ -297,6 +297,20 @@ TEST(IsXmlText, DecidesByEncodingAndCharacter) {
   }
 }
 
+TEST(Wipe, OverwritesAllTheMemoryOfTheText) {
+  std::string text(100, 's');
+  text.resize(60);  // What was longer is still there, beyond the end.
+  const volatile char* const memory = text.data();
+  const std::size_t size = text.capacity();
+  Wipe(text);
+  EXPECT_EQ("", text);
+  ASSERT_EQ(size, text.capacity());
+  EXPECT_EQ(0, std::count(memory, memory + size, 's'));
+  std::string empty;
+  Wipe(empty);
+  EXPECT_EQ("", empty);
+}
+
 }  // namespace
 }  // namespace StringUtil
 }  // namespace Pelmar

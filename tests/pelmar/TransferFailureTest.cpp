@@ -47,6 +47,64 @@ TEST(TransferFailure, IsATimeoutWhenConnectingTakesTooLong) {
   EXPECT_TRUE(typeid(*failure) == typeid(HttpTimeoutException));
 }
 
+TEST(TransferFailure, TellsTheConnectTimeoutThatPassed) {
+  TransferFacts facts = MakeFacts(CURLE_OPERATION_TIMEDOUT);
+  facts.connectTimeoutMicroseconds = 1500000;
+  EXPECT_EQ("No connection to sts.test:443 within 1.5 s", Tell(facts));
+}
+
+TEST(TransferFailure, TellsAProxyThatIsNotFound) {
+  TransferFacts facts = MakeFacts(CURLE_COULDNT_RESOLVE_PROXY);
+  facts.proxyHost = "proxy.test";
+  EXPECT_EQ("Proxy proxy.test was not found", Tell(facts));
+}
+
+TEST(TransferFailure, TellsTheSystemsReasonForNoConnectionToTheProxy) {
+  TransferFacts facts = MakeFacts(CURLE_COULDNT_CONNECT, "", ENETUNREACH);
+  facts.proxyHost = "proxy.test";
+  facts.proxyEndpoint = "proxy.test:3128";
+  EXPECT_EQ("No connection to proxy proxy.test:3128: Network is unreachable", Tell(facts));
+}
+
+TEST(TransferFailure, IsSafeToRetryOnlyWhenNothingWasSent) {
+  TransferFacts refused = MakeFacts(CURLE_COULDNT_CONNECT, "", ECONNREFUSED);
+  EXPECT_TRUE(IsSafeToRetry(refused));
+  refused.wasReady = true;  // Over another connection, which broke.
+  EXPECT_FALSE(IsSafeToRetry(refused));
+  EXPECT_FALSE(IsSafeToRetry(MakeFacts(CURLE_COULDNT_CONNECT, "", ENETUNREACH)));
+  EXPECT_FALSE(IsSafeToRetry(MakeFacts(CURLE_COULDNT_RESOLVE_HOST)));
+  EXPECT_FALSE(IsSafeToRetry(MakeFacts(CURLE_SEND_ERROR, "", ECONNREFUSED)));
+  EXPECT_FALSE(IsSafeToRetry(MakeFacts(CURLE_RECV_ERROR, "", ECONNRESET)));
+  EXPECT_FALSE(IsSafeToRetry(MakeFacts(CURLE_GOT_NOTHING)));
+  EXPECT_FALSE(IsSafeToRetry(MakeFacts(CURLE_OK)));
+}
+
+TEST(TransferFailure, IsSafeToRetryWhenTheHandshakeEndsWithoutAReason) {
+  TransferFacts facts = MakeFacts(CURLE_SSL_CONNECT_ERROR, "", ECONNRESET);
+  const auto tls = std::make_shared<TlsRecord>();
+  facts.tls = tls;
+  EXPECT_TRUE(IsSafeToRetry(facts));
+  facts.engineText = "error:0A000126:SSL routines::unexpected eof while reading";
+  EXPECT_TRUE(IsSafeToRetry(facts));
+  facts.engineText = "error:0A00018A:SSL routines::dh key too small";
+  EXPECT_FALSE(IsSafeToRetry(facts));
+  facts.engineText = "";
+  tls->alert = TlsAlert::OTHER;
+  EXPECT_FALSE(IsSafeToRetry(facts));
+  tls->alert = TlsAlert::NONE;
+  tls->problem = CertificateProblem::EXPIRED;
+  EXPECT_FALSE(IsSafeToRetry(facts));
+  facts.code = CURLE_SSL_PINNEDPUBKEYNOTMATCH;
+  EXPECT_FALSE(IsSafeToRetry(facts));
+}
+
+TEST(TransferFailure, IsSafeToRetryWhenTheHandshakeIsNotCompletedInTime) {
+  TransferFacts facts = MakeFacts(CURLE_OPERATION_TIMEDOUT);
+  EXPECT_FALSE(IsSafeToRetry(facts));
+  facts.hasTlsStarted = true;
+  EXPECT_TRUE(IsSafeToRetry(facts));
+}
+
 TEST(TransferFailure, TellsBrokenConnections) {
   EXPECT_EQ("Connection to sts.test:443 broke: No route to host",
             Tell(MakeFacts(CURLE_RECV_ERROR, "", EHOSTUNREACH)));

@@ -349,7 +349,7 @@ void LoopbackServer::Serve(std::size_t index, int socket) {
   {
     ServerConnection connection(*this, index, socket);
     try {
-      if (_tlsContext) {
+      if (_tlsContext && !_tlsSettings->startsByScript) {
         connection.StartTls();
       }
       _scripts[std::min(index, _scripts.size() - 1)](connection);
@@ -370,6 +370,10 @@ void LoopbackServer::Release() {
   const std::lock_guard<std::mutex> lock(_mutex);
   _isReleased = true;
   _changed.notify_all();
+}
+
+void LoopbackServer::StopListening() {
+  ::shutdown(_listener, SHUT_RDWR);
 }
 
 void LoopbackServer::AwaitConnections(std::size_t count) {

@@ -92,6 +92,7 @@ struct TlsServerSettings {
   std::vector<Identity> chain;       ///< Sent after the identity's own certificate.
   std::optional<Identity> clientCa;  ///< Demand a client certificate issued by it.
   int maxVersion = 0;                ///< One of OpenSSL's version numbers; 0: the newest.
+  bool startsByScript = false;       ///< Connections begin without TLS, and scripts call `StartTls`.
   bool inSingleBytes = false;        ///< Everything is sent byte by byte.
   /// With inSingleBytes: after so many bytes of TLS nothing is sent any more.
   std::size_t bytesBeforeSilence = std::numeric_limits<std::size_t>::max();
@@ -104,7 +105,7 @@ class LoopbackServer final {
   using Script = std::function<void(ServerConnection&)>;
 
   explicit LoopbackServer(std::vector<Script> scripts);
-  /// Every script starts after `StartTls`.
+  /// Every script starts after `StartTls`, unless the settings leave that to it.
   LoopbackServer(const TlsServerSettings& settings, std::vector<Script> scripts);
   LoopbackServer(const LoopbackServer&) = delete;
   LoopbackServer& operator=(const LoopbackServer&) = delete;
@@ -116,6 +117,9 @@ class LoopbackServer final {
 
   /// Lets all current and later `AwaitRelease` go on.
   void Release();
+
+  /// Refuses further connections; those that stand go on.
+  void StopListening();
 
   /// Block until it is so.
   void AwaitConnections(std::size_t count);

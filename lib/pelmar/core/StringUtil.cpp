@@ -7,6 +7,7 @@
 
 #include "pelmar/core/Utf8.h"
 
+#include <openssl/crypto.h>
 #include <openssl/rand.h>
 
 #include <algorithm>
@@ -111,6 +112,13 @@ bool IsXmlText(const std::string& text) {
     position += length;
   }
   return true;
+}
+
+void Wipe(std::string& text) noexcept {
+  // What a longer text left behind the end is wiped too; growing up to the capacity takes no new memory.
+  text.resize(text.capacity());
+  OPENSSL_cleanse(&text[0], text.size());
+  text.clear();
 }
 
 }  // namespace StringUtil

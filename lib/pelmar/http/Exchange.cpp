@@ -3,6 +3,7 @@
 
 #include "pelmar/http/Exchange.h"
 
+#include "pelmar/http/Durations.h"
 #include "pelmar/http/HttpLoop.h"
 
 #include <algorithm>
@@ -18,28 +19,19 @@ using Clock = std::chrono::steady_clock;
 
 // Longer waits are cut to this, for the clock would overflow: a hundred years.
 constexpr long long kMaxWaitMicroseconds = 100LL * 365 * 24 * 60 * 60 * 1000000;
-constexpr long long kMicrosecondsPerSecond = 1000000;
 
 Clock::time_point GetDeadline(long long timeoutMicroseconds) {
   return Clock::now() + std::chrono::microseconds(std::min(timeoutMicroseconds, kMaxWaitMicroseconds));
 }
 
-/// Seconds in decimal, with as many digits as needed: "240", "0.5".
-std::string FormatSeconds(long long microseconds) {
-  std::string text = std::to_string(microseconds / kMicrosecondsPerSecond);
-  const long long fraction = microseconds % kMicrosecondsPerSecond;
-  if (fraction != 0) {
-    // The leading one keeps the zeros after the point.
-    std::string digits = std::to_string(kMicrosecondsPerSecond + fraction).substr(1);
-    digits.erase(digits.find_last_not_of('0') + 1);
-    text += "." + digits;
-  }
-  return text;
-}
-
 }  // namespace
 
 PendingRequestItem::~PendingRequestItem() = default;
+
+std::string AgentParts::DescribeRoute() const {
+  const std::string endpoint = spec->GetEndpoint();
+  return options->HasProxy() ? endpoint + " through proxy " + options->GetProxyEndpoint() : endpoint;
+}
 
 Ref<Exchange> Exchange::Create(const AgentParts& agent, RequestParts request,
                                const CompletionFunctor& completion) {
@@ -77,14 +69,14 @@ void Exchange::WaitOrGiveUp(long long timeoutMicroseconds) {
     return;
   }
   const std::string text =
-      "No answer from " + _agent.spec->GetEndpoint() + " within " + FormatSeconds(timeout) + " s";
+      "No answer from " + _agent.DescribeRoute() + " within " + FormatSeconds(timeout) + " s";
   if (Settle(std::make_shared<const HttpTimeoutException>(text), nullptr)) {
     HttpLoop::Get().Abandon(this);
   }
 }
 
-bool Exchange::Settle(const std::shared_ptr<const HttpException>& error,
-                      const Ref<ClientResponse>& response) {
+bool Exchange::Settle(const std::shared_ptr<const HttpException>& error, const Ref<ClientResponse>& response,
+                      bool isSafeToRetry) {
   Work delivery;
   {
     const std::lock_guard<std::mutex> lock(_mutex);
@@ -94,6 +86,7 @@ bool Exchange::Settle(const std::shared_ptr<const HttpException>& error,
     _settled = true;
     _error = error;
     _response = response;
+    _isSafeToRetry = isSafeToRetry;
     delivery.swap(_delivery);
   }
   _wake.notify_all();
@@ -111,6 +104,11 @@ void Exchange::Disarm() {
 bool Exchange::IsSettled() const {
   const std::lock_guard<std::mutex> lock(_mutex);
   return _settled;
+}
+
+bool Exchange::IsSafeToRetry() const {
+  const std::lock_guard<std::mutex> lock(_mutex);
+  return _isSafeToRetry;
 }
 
 Ref<ClientResponse> Exchange::GetResult() const {

@@ -9,6 +9,7 @@
 #include <pelmar/http/Client.h>
 #include <pelmar/http/HttpException.h>
 
+#include "pelmar/http/AgentOptions.h"
 #include "pelmar/http/ClientRequestImpl.h"
 #include "pelmar/http/ConnectionSpecImpl.h"
 #include "pelmar/http/CookieStoreImpl.h"
@@ -32,6 +33,10 @@ struct AgentParts {
   std::uint64_t id;
   Ref<const ConnectionSpecImpl> spec;
   Ref<CookieStoreImpl> cookies;
+  std::shared_ptr<const AgentOptions> options;
+
+  /// Where requests go, for messages: "HOST:PORT", or "HOST:PORT through proxy HOST:PORT".
+  std::string DescribeRoute() const;
 };
 
 /// An exchange is settled once, by whoever comes first: the HTTP loop with the outcome, `Cancel`, or a waiter
@@ -50,9 +55,12 @@ class Exchange final : public PendingRequestItem {
   /// HttpTimeoutException when it passes.
   void WaitOrGiveUp(long long timeoutMicroseconds);
 
-  /// False when the exchange had been settled before. Exactly one of the two is given.
-  bool Settle(const std::shared_ptr<const HttpException>& error, const Ref<ClientResponse>& response);
+  /// False when the exchange had been settled before. Exactly one of the first two is given.
+  bool Settle(const std::shared_ptr<const HttpException>& error, const Ref<ClientResponse>& response,
+              bool isSafeToRetry = false);
   bool IsSettled() const;
+  /// As `Http::IsSafeToRetry` tells it.
+  bool IsSafeToRetry() const;
   /// For an exchange that could not be started: it is settled without anybody being told.
   void Disarm();
 
@@ -77,6 +85,7 @@ class Exchange final : public PendingRequestItem {
   bool _settled = false;
   std::shared_ptr<const HttpException> _error;
   Ref<ClientResponse> _response;
+  bool _isSafeToRetry = false;
   // Keeps the exchange itself alive until it is settled.
   Work _delivery;
 };

@@ -4,7 +4,6 @@
 #include "pelmar/http/Transfer.h"
 
 #include "pelmar/http/ClientResponseImpl.h"
-#include "pelmar/http/TransferFailure.h"
 #include "pelmar/http/UrlSyntax.h"
 
 #include <pelmar/StringUtil.h>
@@ -22,6 +21,7 @@ constexpr long kOn = 1;
 constexpr long kOff = 0;
 /// The host name of the certificate is checked.
 constexpr long kVerifyHost = 2;
+constexpr long long kMicrosecondsPerMillisecond = 1000;
 
 // The list is given to the owner only when the new line is in it; on failure the engine leaves the list as it
 // was.
@@ -69,6 +69,7 @@ Transfer::Transfer(const Ref<Exchange>& exchange, const SharedState& shared)
   Set(CURLOPT_PRIVATE, this);
   Set(CURLOPT_SHARE, _shared.handle.get());
   SetIsolation();
+  SetProxy();
   SetAddress();
   SetRequest();
   SetHeaders();
@@ -91,16 +92,41 @@ void Transfer::Set(CURLoption option, T value) {
 void Transfer::SetIsolation() {
   Set(CURLOPT_NOSIGNAL, kOn);
   Set(CURLOPT_FOLLOWLOCATION, kOff);
-  Set(CURLOPT_PROXY, "");  // An empty text, unlike none, keeps the environment's proxies out.
   Set(CURLOPT_NETRC, static_cast<long>(CURL_NETRC_IGNORED));
   Set(CURLOPT_HTTP_VERSION, static_cast<long>(CURL_HTTP_VERSION_1_1));
   Set(CURLOPT_HTTP09_ALLOWED, kOff);
-  Set(CURLOPT_CONNECTTIMEOUT, kMaxConnectSeconds);
+  // Rounded up: 0 would stand for the engine's own default.
+  Set(CURLOPT_CONNECTTIMEOUT_MS,
+      static_cast<long>(
+          (_exchange->GetAgent().options->GetConnectTimeoutMicroseconds() + kMicrosecondsPerMillisecond - 1) /
+          kMicrosecondsPerMillisecond));
   Set(CURLOPT_TCP_NODELAY, kOn);
   Set(CURLOPT_TCP_KEEPALIVE,
       kOn);  // Nobody may be waiting with a time-out: a vanished peer shall be noticed.
   // A cancelled exchange must not hold up the loop until its name look-up returns.
   Set(CURLOPT_QUICK_EXIT, kOn);
+}
+
+void Transfer::SetProxy() {
+  const AgentOptions& options = *_exchange->GetAgent().options;
+  // Empty texts, unlike none, keep the environment's proxies and its exceptions from them out.
+  Set(CURLOPT_NOPROXY, "");
+  Set(CURLOPT_PROXY, options.HasProxy() ? ("http://" + options.GetProxyEndpoint()).c_str() : "");
+  if (!options.HasProxy()) {
+    return;
+  }
+  // What the proxy says in answer to CONNECT is not the service's answer, and what we tell the service is not
+  // for the proxy.
+  Set(CURLOPT_SUPPRESS_CONNECT_HEADERS, kOn);
+  Set(CURLOPT_HEADEROPT, static_cast<long>(CURLHEADER_SEPARATE));
+  // The engine would add it on its own; no standard knows it (RFC 9112, appendix C.2.2).
+  Append(_proxyHeaders, "Proxy-Connection:");
+  Set(CURLOPT_PROXYHEADER, _proxyHeaders.get());
+  if (!options.GetProxyUser().empty()) {
+    Set(CURLOPT_PROXYAUTH, static_cast<long>(CURLAUTH_BASIC));
+    Set(CURLOPT_PROXYUSERNAME, options.GetProxyUser().c_str());
+    Set(CURLOPT_PROXYPASSWORD, options.GetProxyPassword().c_str());
+  }
 }
 
 void Transfer::SetAddress() {
@@ -111,7 +137,9 @@ void Transfer::SetAddress() {
   Set(CURLOPT_PROTOCOLS_STR, scheme);
   Set(CURLOPT_PATH_AS_IS, kOn);
   Set(CURLOPT_URL, url.c_str());
-  Set(CURLOPT_REQUEST_TARGET, path.c_str());
+  // A proxy that is not tunnelled through is told the whole URL (RFC 9112, section 3.2.2).
+  const bool isForProxy = _exchange->GetAgent().options->HasProxy() && !spec.IsTls();
+  Set(CURLOPT_REQUEST_TARGET, isForProxy ? url.c_str() : path.c_str());
   if (spec.GetServerName() != spec.GetHost()) {
     Append(_route, "::" + spec.GetEndpoint());
     Set(CURLOPT_CONNECT_TO, _route.get());
@@ -140,6 +168,10 @@ void Transfer::SetHeaders() {
       Append(_headers, std::string(name) + ":");
     }
   }
+  const std::string& userAgent = _exchange->GetAgent().options->GetUserAgent();
+  if (!userAgent.empty()) {
+    Set(CURLOPT_USERAGENT, userAgent.c_str());
+  }
   for (const auto& header : request.headers) {
     // The engine's notation for an empty value.
     const bool isBlank = header.second.find_first_not_of(' ') == std::string::npos;
@@ -166,6 +198,8 @@ void Transfer::SetTls() {
 }
 
 void Transfer::SetReceivers() {
+  Set(CURLOPT_PREREQFUNCTION, &Transfer::OnReady);
+  Set(CURLOPT_PREREQDATA, this);
   Set(CURLOPT_HEADERFUNCTION, &Transfer::OnHeader);
   Set(CURLOPT_HEADERDATA, this);
   Set(CURLOPT_WRITEFUNCTION, &Transfer::OnBody);
@@ -211,6 +245,7 @@ std::size_t Transfer::OnBody(char* data, std::size_t size, std::size_t count, vo
 
 CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
   auto* const self = static_cast<Transfer*>(transfer);
+  self->_hasTlsStarted = true;
   try {
     const ConnectionSpecImpl& spec = *self->_exchange->GetAgent().spec;
     ConfigureTls(static_cast<ssl_ctx_st*>(tls), *spec.GetContext(), spec.GetServerName(), self->_tls,
@@ -224,13 +259,18 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
   return CURLE_SSL_CERTPROBLEM;
 }
 
+int Transfer::OnReady(void* transfer, char*, char*, int, int) noexcept {
+  static_cast<Transfer*>(transfer)->_wasReady = true;
+  return CURL_PREREQFUNC_OK;
+}
+
 void Transfer::Finish(CURLcode code) {
   SaveCookies();
   if (HasSucceeded(code)) {
     _exchange->Settle(nullptr, MakeRef<ClientResponseImpl>(_head.GetStatusCode(), _head.GetReason(),
                                                            CollectHeaders(_easy.get()), std::move(_body)));
   } else {
-    _exchange->Settle(DescribeFailure(code), nullptr);
+    SettleAsFailed(code);
   }
 }
 
@@ -265,24 +305,39 @@ bool Transfer::HasSucceeded(CURLcode code) const {
   return !_tls || !_head.IsEndedByConnection() || (_connectionTls && _connectionTls->hasServerEnded);
 }
 
-std::shared_ptr<const HttpException> Transfer::DescribeFailure(CURLcode code) const {
+void Transfer::SettleAsFailed(CURLcode code) {
   if (!_tlsSetupFault.empty()) {
-    return std::make_shared<const HttpException>(_tlsSetupFault);
+    _exchange->Settle(std::make_shared<const HttpException>(_tlsSetupFault), nullptr);
+    return;
   }
-  const ConnectionSpecImpl& spec = *_exchange->GetAgent().spec;
-  long systemError = 0;
-  curl_easy_getinfo(_easy.get(), CURLINFO_OS_ERRNO, &systemError);
+  const TransferFacts facts = CollectFacts(code);
+  _exchange->Settle(DescribeFailure(facts), nullptr, IsSafeToRetry(facts));
+}
+
+TransferFacts Transfer::CollectFacts(CURLcode code) const {
+  const AgentParts& agent = _exchange->GetAgent();
   TransferFacts facts;
   facts.code = code;
   facts.engineText = _engineText;
-  facts.systemError = static_cast<int>(systemError);
-  facts.host = spec.GetHost();
-  facts.endpoint = spec.GetEndpoint();
-  facts.serverName = spec.GetServerName();
+  long value = 0;
+  curl_easy_getinfo(_easy.get(), CURLINFO_OS_ERRNO, &value);
+  facts.systemError = static_cast<int>(value);
+  value = 0;
+  curl_easy_getinfo(_easy.get(), CURLINFO_HTTP_CONNECTCODE, &value);
+  facts.proxyStatus = static_cast<int>(value);
+  facts.host = agent.spec->GetHost();
+  facts.endpoint = agent.DescribeRoute();
+  facts.serverName = agent.spec->GetServerName();
+  facts.proxyHost = agent.options->GetProxyHost();
+  facts.proxyEndpoint = agent.options->GetProxyEndpoint();
+  facts.hasProxyCredentials = !agent.options->GetProxyUser().empty();
+  facts.connectTimeoutMicroseconds = agent.options->GetConnectTimeoutMicroseconds();
   facts.head = _head;
   facts.isBodyTooLarge = _isBodyTooLarge;
+  facts.wasReady = _wasReady;
+  facts.hasTlsStarted = _hasTlsStarted;
   facts.tls = _tls;
-  return Http::DescribeFailure(facts);
+  return facts;
 }
 
 }  // namespace Http

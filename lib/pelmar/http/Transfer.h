@@ -11,6 +11,7 @@
 #include "pelmar/http/ResponseHead.h"
 #include "pelmar/http/SpecShare.h"
 #include "pelmar/http/TlsRecord.h"
+#include "pelmar/http/TransferFailure.h"
 
 #include <cstddef>
 #include <memory>
@@ -41,6 +42,7 @@ class Transfer final {
   void Set(CURLoption option, T value);
   void SetAddress();
   void SetIsolation();
+  void SetProxy();
   void SetRequest();
   void SetHeaders();
   void SetTls();
@@ -50,21 +52,26 @@ class Transfer final {
   static std::size_t OnHeader(char* data, std::size_t size, std::size_t count, void* transfer) noexcept;
   static std::size_t OnBody(char* data, std::size_t size, std::size_t count, void* transfer) noexcept;
   static CURLcode OnTlsContext(CURL* easy, void* tls, void* transfer) noexcept;
+  static int OnReady(void* transfer, char*, char*, int, int) noexcept;
 
   void NoteConnection();
   void SaveCookies();
   bool HasSucceeded(CURLcode code) const;
-  std::shared_ptr<const HttpException> DescribeFailure(CURLcode code) const;
+  TransferFacts CollectFacts(CURLcode code) const;
+  void SettleAsFailed(CURLcode code);
 
   const Ref<Exchange> _exchange;
   const SharedState _shared;
   char _engineText[CURL_ERROR_SIZE] = "";
   TextList _headers;
+  TextList _proxyHeaders;
   TextList _route;
   std::vector<std::string> _cookiesBefore;
   ResponseHead _head;
   std::string _body;
   bool _isBodyTooLarge = false;
+  bool _wasReady = false;  // A connection stood, and the request was about to be sent.
+  bool _hasTlsStarted = false;
   std::shared_ptr<TlsRecord> _tls;
   std::shared_ptr<const TlsRecord> _connectionTls;  // Another's if the connection was open already.
   std::string _tlsSetupFault;

@@ -3,6 +3,8 @@
 
 #include "pelmar/http/TransferFailure.h"
 
+#include "pelmar/http/Durations.h"
+
 #include <pelmar/http/Client.h>
 
 #include <cerrno>
@@ -134,24 +136,45 @@ std::string DescribeBrokenConnection(const TransferFacts& facts) {
   return DescribeEnd(facts, "closed the connection");
 }
 
-std::string DescribeHandshakeFailure(const TransferFacts& facts) {
+/// What either side objected to; empty when the connection just ended.
+std::string DescribeHandshakeObjection(const TransferFacts& facts) {
   if (facts.tls && facts.tls->problem != CertificateProblem::NONE) {
     return DescribeCertificateProblem(facts);
   }
-  std::string tlsFailure = DescribeTlsFailure(facts);
-  if (!tlsFailure.empty() && FindTlsFailureReason(facts.engineText).kind != TlsFailureKind::UNEXPECTED_END) {
-    return tlsFailure;
+  return FindTlsFailureReason(facts.engineText).kind == TlsFailureKind::UNEXPECTED_END
+             ? std::string()
+             : DescribeTlsFailure(facts);
+}
+
+std::string DescribeHandshakeFailure(const TransferFacts& facts) {
+  std::string objection = DescribeHandshakeObjection(facts);
+  if (!objection.empty()) {
+    return objection;
   }
   return facts.endpoint + (IsReset(facts.systemError) ? " reset" : " closed") +
          " the connection during the TLS handshake";
 }
 
 std::string DescribeConnectFailure(const TransferFacts& facts) {
+  const std::string peer = facts.proxyHost.empty() ? facts.endpoint : "proxy " + facts.proxyEndpoint;
   if (facts.systemError == ECONNREFUSED) {
-    return "Connection refused by " + facts.endpoint;
+    return "Connection refused by " + peer;
   }
-  return "No connection to " + facts.endpoint +
+  return "No connection to " + peer +
          (facts.systemError == 0 ? std::string() : ": " + DescribeSystemError(facts.systemError));
+}
+
+/// What the proxy had against opening a way to the server; empty when it was nothing.
+std::string DescribeProxyRefusal(const TransferFacts& facts) {
+  constexpr int kProxyAuthenticationRequired = 407;
+  if (facts.proxyStatus == 0 || facts.proxyStatus / 100 == 2) {
+    return std::string();
+  }
+  const std::string proxy = "Proxy " + facts.proxyEndpoint;
+  if (facts.proxyStatus == kProxyAuthenticationRequired) {
+    return proxy + (facts.hasProxyCredentials ? " refused the credentials" : " demands credentials");
+  }
+  return proxy + " opens no way to the service: it answered " + std::to_string(facts.proxyStatus);
 }
 
 /// What our own callbacks objected to; empty when it was nothing.
@@ -194,6 +217,10 @@ std::string Describe(const TransferFacts& facts) {
   if (!refusal.empty()) {
     return refusal;
   }
+  std::string proxyRefusal = DescribeProxyRefusal(facts);
+  if (!proxyRefusal.empty()) {
+    return proxyRefusal;
+  }
   switch (facts.code) {
     case CURLE_OK:
       // The engine takes the end of the connection inside the headers for the end of the answer.
@@ -202,10 +229,13 @@ std::string Describe(const TransferFacts& facts) {
                  : DescribeEnd(facts, "closed the connection");
     case CURLE_COULDNT_RESOLVE_HOST:
       return "Host " + facts.host + " was not found";
+    case CURLE_COULDNT_RESOLVE_PROXY:
+      return "Proxy " + facts.proxyHost + " was not found";
     case CURLE_COULDNT_CONNECT:
       return DescribeConnectFailure(facts);
     case CURLE_OPERATION_TIMEDOUT:
-      return "No connection to " + facts.endpoint + " within " + std::to_string(kMaxConnectSeconds) + " s";
+      return "No connection to " + facts.endpoint + " within " +
+             FormatSeconds(facts.connectTimeoutMicroseconds) + " s";
     case CURLE_SSL_CONNECT_ERROR:
     case CURLE_PEER_FAILED_VERIFICATION:
     case CURLE_SSL_CLIENTCERT:
@@ -234,7 +264,29 @@ std::string Describe(const TransferFacts& facts) {
   }
 }
 
+/// Neither side had anything against the other. What OpenSSL or an alert gave as a reason would come again.
+bool WasHandshakeBrokenOff(const TransferFacts& facts) {
+  return DescribeHandshakeObjection(facts).empty();
+}
+
 }  // namespace
+
+bool IsSafeToRetry(const TransferFacts& facts) {
+  // A kept connection that breaks is replaced by the engine, and the server may have read what went over it.
+  if (facts.wasReady) {
+    return false;
+  }
+  switch (facts.code) {
+    case CURLE_COULDNT_CONNECT:
+      return facts.systemError == ECONNREFUSED;
+    case CURLE_SSL_CONNECT_ERROR:
+      return WasHandshakeBrokenOff(facts);
+    case CURLE_OPERATION_TIMEDOUT:
+      return facts.hasTlsStarted;
+    default:
+      return false;
+  }
+}
 
 std::shared_ptr<const HttpException> DescribeFailure(const TransferFacts& facts) {
   const std::string text = Describe(facts);

@@ -19,8 +19,8 @@
 namespace Pelmar {
 namespace Http {
 
-/// How long the TCP connection and the TLS handshake may take together when nobody waits with a shorter
-/// time-out.
+/// How long the TCP connection and the TLS handshake may take together when the user agent has no other
+/// connect time-out and nobody waits with a shorter one.
 constexpr long kMaxConnectSeconds = 300;
 
 struct TransferFacts {
@@ -28,8 +28,15 @@ struct TransferFacts {
   std::string engineText;  ///< The engine's own message; may be empty.
   int systemError = 0;     ///< errno of the failed system call; 0 when none is known.
   std::string host;        ///< Where the connection goes.
-  std::string endpoint;    ///< The same as "HOST:PORT".
+  std::string endpoint;    ///< The same as "HOST:PORT", with the proxy on the way.
   std::string serverName;  ///< Whom the certificate should be for.
+  std::string proxyHost;   ///< Empty without a proxy.
+  std::string proxyEndpoint;
+  bool hasProxyCredentials = false;
+  int proxyStatus = 0;  ///< The proxy's answer to CONNECT; 0 when there was none.
+  long long connectTimeoutMicroseconds = kMaxConnectSeconds * 1000000LL;
+  bool wasReady = false;       ///< A connection stood, so that some of the request may have been sent.
+  bool hasTlsStarted = false;  ///< TCP, and the way through the proxy, were open.
   ResponseHead head;
   bool isBodyTooLarge = false;
   std::shared_ptr<const TlsRecord> tls;  ///< Null without TLS.
@@ -37,6 +44,10 @@ struct TransferFacts {
 
 /// The exception for an exchange that failed. Never null.
 std::shared_ptr<const HttpException> DescribeFailure(const TransferFacts& facts);
+
+/// Whether nothing of the request can have reached the server, and trying again may help: the connection was
+/// refused, or the TLS handshake broken off or not completed in time.
+bool IsSafeToRetry(const TransferFacts& facts);
 
 }  // namespace Http
 }  // namespace Pelmar

@@ -8,6 +8,7 @@
 #include <pelmar/Exception.h>
 
 #include <atomic>
+#include <memory>
 
 namespace Pelmar {
 namespace Http {
@@ -25,8 +26,9 @@ ConnectionPool::~ConnectionPool() = default;
 
 UserAgent::~UserAgent() = default;
 
-UserAgentImpl::UserAgentImpl(const Ref<const ConnectionSpecImpl>& spec, const Ref<CookieStoreImpl>& cookies)
-    : _parts{DrawId(), spec, cookies} {}
+UserAgentImpl::UserAgentImpl(const Ref<const ConnectionSpecImpl>& spec, const Ref<CookieStoreImpl>& cookies,
+                             const ClientOptions& options)
+    : _parts{DrawId(), spec, cookies, std::make_shared<const AgentOptions>(options)} {}
 
 UserAgentImpl::~UserAgentImpl() {
   HttpLoop::Get().DropAgent(_parts.id);
@@ -65,6 +67,11 @@ void UserAgentImpl::WaitFor(const Ref<PendingRequestItem>& item, long long timeo
 
 Ref<UserAgent> CreateHttpUserAgent(const Ref<ConnectionSpec>& spec, const Ref<CookieStore>& cookies,
                                    const Ref<ConnectionPool>& pool) {
+  return CreateHttpUserAgent(spec, cookies, pool, ClientOptions());
+}
+
+Ref<UserAgent> CreateHttpUserAgent(const Ref<ConnectionSpec>& spec, const Ref<CookieStore>& cookies,
+                                   const Ref<ConnectionPool>& pool, const ClientOptions& options) {
   const Ref<const ConnectionSpecImpl> ownSpec = ToConnectionSpecImpl(spec.Get());
   auto* const ownCookies = dynamic_cast<CookieStoreImpl*>(cookies.Get());
   if (ownCookies == nullptr) {
@@ -73,7 +80,12 @@ Ref<UserAgent> CreateHttpUserAgent(const Ref<ConnectionSpec>& spec, const Ref<Co
   if (pool) {
     throw InvalidArgumentException("there are no connection pools, so the pool must be null");
   }
-  return MakeRef<UserAgentImpl>(ownSpec, Ref<CookieStoreImpl>(ownCookies));
+  return MakeRef<UserAgentImpl>(ownSpec, Ref<CookieStoreImpl>(ownCookies), options);
+}
+
+bool IsSafeToRetry(const Ref<PendingRequestItem>& item) {
+  const auto* const exchange = dynamic_cast<const Exchange*>(item.Get());
+  return exchange != nullptr && exchange->IsSafeToRetry();
 }
 
 }  // namespace Http

@@ -15,7 +15,8 @@ namespace Http {
 
 class UserAgentImpl final : public UserAgent {
  public:
-  UserAgentImpl(const Ref<const ConnectionSpecImpl>& spec, const Ref<CookieStoreImpl>& cookies);
+  UserAgentImpl(const Ref<const ConnectionSpecImpl>& spec, const Ref<CookieStoreImpl>& cookies,
+                const ClientOptions& options);
 
   void SendAsync(const Ref<ClientRequest>& request, const CompletionFunctor& completion,
                  Ref<PendingRequestItem>& item) override;

@@ -33,6 +33,10 @@ PELMAR_API std::string ToUpper(const std::string& text);
 /// 2).
 PELMAR_API bool IsXmlText(const std::string& text);
 
+/// Overwrites all memory that `text` holds, in a way that no compiler leaves out, and makes it empty. For
+/// passwords that are no longer needed; copies made before are not reached.
+PELMAR_API void Wipe(std::string& text) noexcept;
+
 }  // namespace StringUtil
 }  // namespace Pelmar
 

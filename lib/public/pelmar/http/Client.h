@@ -115,9 +115,9 @@ class PELMAR_API PendingRequestItem : public System::ScheduledItem {
 /// three are valid during the call only (the response may be kept by a `Ref`).
 typedef boost::function<void(const Exception*, ClientResponse*, PendingRequestItem*)> CompletionFunctor;
 
-/// An HTTP client with its own connections and cookies. Redirects are not followed and no proxy is used.
-/// May be released while requests are pending: they go on, and their functors are called. Any number of
-/// requests may be pending, and any thread may send and wait.
+/// An HTTP client with its own connections and cookies. Redirects are not followed, and no proxy is used but
+/// the one that ClientOptions name. May be released while requests are pending: they go on, and their
+/// functors are called. Any number of requests may be pending, and any thread may send and wait.
 ///
 /// A kept connection that the server has closed is replaced, and the request sent again, if no byte of an
 /// answer had come. When the process exits, pending requests end with an HttpException; functors that have
@@ -125,10 +125,10 @@ typedef boost::function<void(const Exception*, ClientResponse*, PendingRequestIt
 class PELMAR_API UserAgent : public Object {
  public:
   /// Starts the exchange and returns. `completion` is called once, on a platform thread, perhaps before this
-  /// call returns. Connecting may take 300 s; beyond that nothing but `Cancel` and `WaitFor` limits the time.
-  /// Throws InvalidArgumentException for a null request, a GET with a body or an empty functor,
-  /// InvalidStateException for a request that was sent before, HttpException when the system has no thread or
-  /// descriptors left.
+  /// call returns. Connecting may take 300 s unless ClientOptions say otherwise; beyond that nothing but
+  /// `Cancel` and `WaitFor` limits the time. Throws InvalidArgumentException for a null request, a GET with a
+  /// body or an empty functor, InvalidStateException for a request that was sent before, HttpException when
+  /// the system has no thread or descriptors left.
   virtual void SendAsync(const Ref<ClientRequest>& request, const CompletionFunctor& completion,
                          Ref<PendingRequestItem>& item) = 0;
 
