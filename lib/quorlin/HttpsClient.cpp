@@ -33,6 +33,26 @@ Pelmar::Ref<Http::UserAgent> CreateUserAgent(Http::ConnectionSpec* spec) {
   return Http::CreateHttpUserAgent(Pelmar::Ref<Http::ConnectionSpec>(spec), cookies, nullptr);
 }
 
+}  // namespace
+
+HttpsEndpoint MakeHttpsEndpoint(const std::string& url, Pelmar::Ssl::SSLContext* sslContext,
+                                const std::string& sslConnectionParam) {
+  const Http::HttpURL parts = Http::ParseHttpURL(url);
+  if (parts.isHttps && sslContext == nullptr) {
+    throw Pelmar::InvalidArgumentException("HTTPS connection requested but no SSLContext provided.");
+  }
+  if (!parts.isHttps && !sslConnectionParam.empty()) {
+    // Whoever pins a key wants to talk to nobody else.
+    throw Pelmar::InvalidArgumentException("Public-key pins given, but the URL is not https.");
+  }
+  const Pelmar::Ref<Http::ConnectionSpec> tcp = Http::CreateTCPConnectionSpec(parts.host, parts.port);
+  if (!parts.isHttps) {
+    return {tcp, parts.path};
+  }
+  const Pelmar::Ref<Pelmar::Ssl::SSLContext> context(sslContext);
+  return {Http::CreateSSLConnectionSpec(tcp, context, parts.host, sslConnectionParam), parts.path};
+}
+
 Pelmar::Ref<Http::ClientRequest> CreatePost(const std::string& path, const Request& request) {
   const Pelmar::Ref<Http::ClientRequest> post = Http::CreateHttpRequest(Http::METHOD_POST, path);
   post->SetHeader("Content-Type", "text/xml");
@@ -41,8 +61,6 @@ Pelmar::Ref<Http::ClientRequest> CreatePost(const std::string& path, const Reque
   post->GetBodyWriter()->Write(request.body.data(), request.body.size());
   return post;
 }
-
-}  // namespace
 
 HttpsSession::HttpsSession(Http::ConnectionSpec* spec, const std::string& path, long long timeoutMicroseconds)
     : _userAgent(CreateUserAgent(spec)), _path(path), _timeoutMicroseconds(timeoutMicroseconds) {}
@@ -81,20 +99,9 @@ void HttpsSession::SendRequestAsync(const Request& request, const ResponseCallba
 HttpsClient::HttpsClient(const std::string& url, Pelmar::Ssl::SSLContext* sslContext,
                          std::string sslConnectionParam, long long timeoutMicroseconds)
     : _sslContext(sslContext), _timeoutMicroseconds(timeoutMicroseconds) {
-  const Http::HttpURL parts = Http::ParseHttpURL(url);
-  _path = parts.path;
-  if (parts.isHttps && !_sslContext) {
-    throw Pelmar::InvalidArgumentException("HTTPS connection requested but no SSLContext provided.");
-  }
-  if (!parts.isHttps && !sslConnectionParam.empty()) {
-    // Whoever pins a key wants to talk to nobody else.
-    throw Pelmar::InvalidArgumentException("Public-key pins given, but the URL is not https.");
-  }
-  _connectionSpec = Http::CreateTCPConnectionSpec(parts.host, parts.port);
-  if (parts.isHttps) {
-    _connectionSpec =
-        Http::CreateSSLConnectionSpec(_connectionSpec, _sslContext, parts.host, sslConnectionParam);
-  }
+  HttpsEndpoint endpoint = MakeHttpsEndpoint(url, sslContext, sslConnectionParam);
+  _connectionSpec = endpoint.spec;
+  _path = std::move(endpoint.path);
 }
 
 boost::shared_ptr<TransportSession> HttpsClient::CreateSession() const {

@@ -25,6 +25,22 @@ constexpr long long kServiceTimeoutMicroseconds = 240000000;
 /// How long a round of a GSS negotiation context waits: 40 seconds.
 constexpr long long kNegotiationTimeoutMicroseconds = 40000000;
 
+/// Where requests are posted to.
+struct HttpsEndpoint {
+  Pelmar::Ref<Pelmar::Http::ConnectionSpec> spec;
+  std::string path;
+};
+
+/// `sslContext` may be null for an http: URL; for https: that is an InvalidArgumentException.
+/// `sslConnectionParam` is handed to the TLS layer as it is; not empty for an http: URL, where nothing could
+/// keep to it, is an InvalidArgumentException. Throws also what the platform's URL parser and
+/// connection specs throw.
+HttpsEndpoint MakeHttpsEndpoint(const std::string& url, Pelmar::Ssl::SSLContext* sslContext,
+                                const std::string& sslConnectionParam);
+
+/// The HTTP request that carries `request`.
+Pelmar::Ref<Pelmar::Http::ClientRequest> CreatePost(const std::string& path, const Request& request);
+
 /// A session on a user agent and a cookie store of its own, so that cookies last exactly as long as the
 /// session.
 class HttpsSession final : public TransportSession {
@@ -48,10 +64,7 @@ class HttpsSession final : public TransportSession {
 /// Posts requests to one URL.
 class HttpsClient final : public Transport {
  public:
-  /// `sslContext` may be null for an http: URL; for https: that is an InvalidArgumentException.
-  /// `sslConnectionParam` is handed to the TLS layer as it is; not empty for an http: URL, where nothing could
-  /// keep to it, is an InvalidArgumentException. Throws also what the platform's URL parser and
-  /// connection specs throw.
+  /// Throws like `MakeHttpsEndpoint`, which takes the same first three.
   HttpsClient(const std::string& url, Pelmar::Ssl::SSLContext* sslContext, std::string sslConnectionParam,
               long long timeoutMicroseconds);
 

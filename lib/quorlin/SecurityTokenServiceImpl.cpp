@@ -10,12 +10,14 @@
 #include <pelmar/Verify.h>
 #include <pelmar/service/Logger.h>
 #include <quorlin/Exceptions.h>
+#include <quorlin/ServiceOptions.h>
 
 #include <boost/bind/bind.hpp>
 #include <boost/make_shared.hpp>
 
 #include "quorlin/HttpsClient.h"
 #include "quorlin/OperationFrame.h"
+#include "quorlin/OptionsTransport.h"
 #include "quorlin/Request.h"
 #include "quorlin/RequestBuilderImpl.h"
 #include "quorlin/ResponseHandlerImpl.h"
@@ -310,7 +312,7 @@ void SecurityTokenServiceImpl::ContinueSPNegotiation(TransportSession& session, 
   _responseHandler->HandleSPNegoResponse(answer.Get(), response);
 }
 
-// ---- The factory ----
+// ---- The factories ----
 
 boost::shared_ptr<SecurityTokenService> CreateSecurityTokenService(const SecurityTokenServiceConfig& config) {
   const boost::shared_ptr<const RequestBuilder> requestBuilder =
@@ -320,6 +322,39 @@ boost::shared_ptr<SecurityTokenService> CreateSecurityTokenService(const Securit
   const boost::shared_ptr<const ResponseHandler> responseHandler = boost::make_shared<ResponseHandlerImpl>();
   return boost::make_shared<SecurityTokenServiceImpl>(requestBuilder, transport, responseHandler,
                                                       config.trustedStsCertificates);
+}
+
+boost::shared_ptr<SecurityTokenService> CreateSecurityTokenService(const SecurityTokenServiceConfig& config,
+                                                                   const ServiceOptions& options) {
+  const boost::shared_ptr<const RequestBuilder> requestBuilder =
+      boost::make_shared<RequestBuilderImpl>(config.holderOfKeyConfig);
+  const boost::shared_ptr<const Transport> transport = boost::make_shared<OptionsTransport>(config, options);
+  const boost::shared_ptr<const ResponseHandler> responseHandler = boost::make_shared<ResponseHandlerImpl>();
+  return boost::make_shared<SecurityTokenServiceImpl>(requestBuilder, transport, responseHandler,
+                                                      config.trustedStsCertificates);
+}
+
+boost::shared_ptr<SecurityTokenService> SecurityTokenServiceImpl::WithCancellation(
+    const Pelmar::Ref<Pelmar::System::CancellationHandle>& cancellation) const {
+  const auto* const transport = dynamic_cast<const OptionsTransport*>(_transport.get());
+  if (transport == nullptr) {
+    throw Pelmar::InvalidArgumentException("the service was made without options");
+  }
+  return boost::make_shared<SecurityTokenServiceImpl>(
+      _requestBuilder, transport->WithCancellation(cancellation), _responseHandler, _trustedStsCertificates);
+}
+
+boost::shared_ptr<SecurityTokenService> CreateCancellableService(
+    const SecurityTokenService& service,
+    const Pelmar::Ref<Pelmar::System::CancellationHandle>& cancellation) {
+  if (!cancellation) {
+    throw Pelmar::InvalidArgumentException("there is no handle that could cancel");
+  }
+  const auto* const own = dynamic_cast<const SecurityTokenServiceImpl*>(&service);
+  if (own == nullptr) {
+    throw Pelmar::InvalidArgumentException("the service was made without options");
+  }
+  return own->WithCancellation(cancellation);
 }
 
 }  // namespace Quorlin

@@ -9,6 +9,7 @@
 #include <pelmar/Reader.h>
 #include <pelmar/Ref.h>
 #include <pelmar/crypto/Certificate.h>
+#include <pelmar/system/CancellationHandle.h>
 #include <quorlin/SecurityTokenService.h>
 
 #include <boost/shared_ptr.hpp>
@@ -52,6 +53,10 @@ class SecurityTokenServiceImpl final : public SecurityTokenService {
                             const ValidationCompletion& done) const override;
   void RenewTokenAsync(const boost::shared_ptr<const SamlToken>& token, long long lifetimeSec,
                        const TokenCompletion& done) const override;
+
+  /// As `CreateCancellableService` gives it.
+  boost::shared_ptr<SecurityTokenService> WithCancellation(
+      const Pelmar::Ref<Pelmar::System::CancellationHandle>& cancellation) const;
 
  private:
   // What a queued call runs on: it shares the three parts and outlives the caller's pointer.

@@ -5,6 +5,8 @@
 // them.
 
 #include "apps/ChildProcess.h"
+#include "support/HttpScripts.h"
+#include "support/LoopbackServer.h"
 #include "support/Pki.h"
 #include "support/Process.h"
 #include "support/TemporaryDirectory.h"
@@ -310,6 +312,39 @@ TEST(Examples, ValidateReceivedTokenAsksTheHolderForTheKey) {
   EXPECT_EQ(holder.standardError, "");
   EXPECT_EQ(holder.standardOutput, "welcome {Name: robot; Domain:example.com}\n");
   EXPECT_EQ(holder.exitCode, 0);
+}
+
+TEST(Examples, WithOptionsPrintsWhomTheTokenIsFor) {
+  const World world;
+  const ProcessResult result = world.RunClient("withOptions", {"alice@example.com"}, "secret\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(Mask(result.standardOutput, kDatePattern, "DATE"),
+            "{Name: alice; Domain:example.com} until DATE\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, WithOptionsGoesThroughTheProxy) {
+  const World world;
+  const TestSupport::ClosedPort port;
+  const std::string proxy = "127.0.0.1:" + std::to_string(port.GetPort());
+  const ProcessResult result =
+      world.RunClient("withOptions", {"alice@example.com", "http://" + proxy}, "secret\n");
+  EXPECT_EQ(result.standardError, "Connection refused by proxy " + proxy + "\n");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, WithOptionsEndsAtCtrlC) {
+  const World world;
+  TestSupport::LoopbackServer server({&TestSupport::StaySilent});
+  StsTests::ChildProcess child(
+      {GetExamplePath("withOptions"), "http://" + server.GetEndpoint() + "/sts", world.GetPath("ca.pem"),
+       world.GetPath("sts.pem"), "alice@example.com"},
+      StsTests::ChildProcess::Terminal::OWN);
+  child.Type("secret\n");
+  server.AwaitRequests(1);
+  child.Type("\x03");
+  EXPECT_EQ(child.ReadAll(), "secret\r\n^CThe operation was cancelled.\r\n");
+  EXPECT_EQ(child.Wait(), 1);
 }
 
 TEST(Examples, AcquireAsyncGetsTheTokensOfAllUsers) {

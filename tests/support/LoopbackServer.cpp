@@ -15,7 +15,10 @@
 #include <algorithm>
 #include <csignal>
 #include <cstdint>
+#include <cstdio>
 #include <cstdlib>
+#include <fstream>
+#include <sstream>
 #include <stdexcept>
 #include <utility>
 
@@ -44,7 +47,7 @@ sockaddr_in MakeAddress(int port) {
 }
 
 /// A socket on a free port; the port goes to `port`.
-int Bind(int& port) {
+int BindSocket(int& port) {
   const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
   Require(socket >= 0, "no socket");
   sockaddr_in address = MakeAddress(0);
@@ -125,6 +128,23 @@ BIO* MakeSlowBio(ServerConnection* connection) {
   BIO_set_data(bio, connection);
   BIO_set_init(bio, 1);
   return bio;
+}
+
+/// How many connections of this machine to that port await the answer to their SYN.
+int CountAttempts(int port) {
+  char address[16];
+  std::snprintf(address, sizeof address, "0100007F:%04X", static_cast<unsigned>(port));
+  std::ifstream table("/proc/net/tcp");
+  Require(table.is_open(), "no table of connections");
+  int count = 0;
+  std::string line;
+  while (std::getline(table, line)) {
+    std::istringstream fields(line);
+    std::string number, local, remote, state;
+    fields >> number >> local >> remote >> state;
+    count += remote == address && state == "02" ? 1 : 0;
+  }
+  return count;
 }
 
 /// How many bytes of body the head announces.
@@ -286,11 +306,18 @@ void LoopbackServer::TlsContextDeleter::operator()(SSL_CTX* context) const noexc
 }
 
 LoopbackServer::LoopbackServer(std::vector<Script> scripts) : _scripts(std::move(scripts)) {
+  Bind();
+  Listen();
+}
+
+LoopbackServer::LoopbackServer(ClosedPort& port, std::vector<Script> scripts)
+    : _scripts(std::move(scripts)), _listener(port.TakeSocket()), _port(port.GetPort()) {
   Listen();
 }
 
 LoopbackServer::LoopbackServer(const TlsServerSettings& settings, std::vector<Script> scripts)
     : _scripts(std::move(scripts)), _tlsSettings(settings), _tlsContext(MakeTlsContext(settings)) {
+  Bind();
   Listen();
 }
 
@@ -317,8 +344,11 @@ std::string LoopbackServer::GetEndpoint() const {
   return "127.0.0.1:" + std::to_string(_port);
 }
 
+void LoopbackServer::Bind() {
+  _listener = BindSocket(_port);
+}
+
 void LoopbackServer::Listen() {
-  _listener = Bind(_port);
   Require(::listen(_listener, kBacklog) == 0, "cannot listen");
   _acceptor = std::thread([this] { Accept(); });
 }
@@ -410,7 +440,7 @@ ConnectionRecord LoopbackServer::GetRecord(std::size_t connection) const {
 // --- FullListener ---
 
 FullListener::FullListener() {
-  _sockets.push_back(Bind(_port));
+  _sockets.push_back(BindSocket(_port));
   Require(::listen(_sockets[0], 0) == 0, "cannot listen");
   const sockaddr_in address = MakeAddress(_port);
   tcp_info info = {};
@@ -426,6 +456,14 @@ FullListener::FullListener() {
   } while (info.tcpi_state != TCP_SYN_SENT);
 }
 
+void FullListener::AwaitAttempt() const {
+  // There is one attempt of our own. Nobody but the system knows of such; it tells nobody unasked.
+  constexpr int kOwnAttempts = 1;
+  while (CountAttempts(_port) <= kOwnAttempts) {
+    std::this_thread::yield();
+  }
+}
+
 FullListener::~FullListener() {
   for (const int socket : _sockets) {
     ::close(socket);
@@ -434,10 +472,16 @@ FullListener::~FullListener() {
 
 // --- ClosedPort ---
 
-ClosedPort::ClosedPort() : _socket(Bind(_port)) {}
+ClosedPort::ClosedPort() : _socket(BindSocket(_port)) {}
 
 ClosedPort::~ClosedPort() {
-  ::close(_socket);
+  if (_socket >= 0) {
+    ::close(_socket);
+  }
+}
+
+int ClosedPort::TakeSocket() {
+  return std::exchange(_socket, -1);
 }
 
 }  // namespace TestSupport

@@ -25,6 +25,7 @@ struct ssl_ctx_st;
 
 namespace TestSupport {
 
+class ClosedPort;
 class LoopbackServer;
 
 /// What the server keeps of one connection.
@@ -105,6 +106,8 @@ class LoopbackServer final {
   using Script = std::function<void(ServerConnection&)>;
 
   explicit LoopbackServer(std::vector<Script> scripts);
+  /// At that port, from now on.
+  LoopbackServer(ClosedPort& port, std::vector<Script> scripts);
   /// Every script starts after `StartTls`, unless the settings leave that to it.
   LoopbackServer(const TlsServerSettings& settings, std::vector<Script> scripts);
   LoopbackServer(const LoopbackServer&) = delete;
@@ -136,6 +139,7 @@ class LoopbackServer final {
     void operator()(ssl_ctx_st* context) const noexcept;
   };
 
+  void Bind();
   void Listen();
   void Accept();
   void Serve(std::size_t index, int socket);
@@ -167,6 +171,8 @@ class FullListener final {
   ~FullListener();
 
   int GetPort() const { return _port; }
+  /// Blocks until somebody tries to connect.
+  void AwaitAttempt() const;
 
  private:
   std::vector<int> _sockets;
@@ -182,6 +188,8 @@ class ClosedPort final {
   ~ClosedPort();
 
   int GetPort() const { return _port; }
+  /// The bound socket, which is the caller's from now on. Once.
+  int TakeSocket();
 
  private:
   int _port = 0;  // Before the socket, whose making sets it.

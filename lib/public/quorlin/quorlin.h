@@ -13,6 +13,7 @@
 #include <quorlin/SamlToken.h>
 #include <quorlin/SecurityTokenService.h>
 #include <quorlin/SecurityTokenServiceConfig.h>
+#include <quorlin/ServiceOptions.h>
 #include <quorlin/TokenSpec.h>
 
 #endif  // QUORLIN_QUORLIN_H
