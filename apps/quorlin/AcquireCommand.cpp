@@ -7,7 +7,7 @@
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
 #include "quorlin/Password.h"
-#include "quorlin/Progress.h"
+#include "quorlin/ServiceCall.h"
 #include "quorlin/TokenFile.h"
 
 #include <quorlin/SecurityTokenService.h>
@@ -22,6 +22,7 @@ namespace {
 /// What the ways to acquire a token have in common, and what only one of them has.
 struct AcquireArguments {
   ServiceOptions service;
+  CallOptions call;
   HolderOfKeyOptions holderOfKey;
   TokenOptions token;
   OutputOptions output;
@@ -35,22 +36,22 @@ using TokenPointer = boost::shared_ptr<const Quorlin::SamlToken>;
 
 TokenPointer AcquireByPassword(const AcquireArguments& arguments) {
   // Everything that can be wrong with the arguments comes before the question for the password.
-  const boost::shared_ptr<Quorlin::SecurityTokenService> service =
-      Quorlin::CreateSecurityTokenService(MakeServiceConfig(arguments.service, arguments.holderOfKey));
+  const ServiceCall call(MakeServiceConfig(arguments.service, arguments.holderOfKey), arguments.call);
   const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
   if (IsPlainHttp(arguments.service)) {
     std::cerr << "quorlin: warning: with an http: URL the password can be read on its way\n";
   }
   const Secret password = ReadPassword(arguments.password, arguments.userName);
-  const Progress progress;
-  return service->AcquireToken(arguments.userName, password.Reveal(), spec);
+  return call.Run([&](const Quorlin::SecurityTokenService& service) {
+    return service.AcquireToken(arguments.userName, password.Reveal(), spec);
+  });
 }
 
 TokenPointer AcquireByCertificate(const AcquireArguments& arguments) {
   const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
-  const Progress progress;
-  return Quorlin::CreateSecurityTokenService(MakeServiceConfig(arguments.service, arguments.holderOfKey))
-      ->AcquireTokenByCertificate(spec);
+  const ServiceCall call(MakeServiceConfig(arguments.service, arguments.holderOfKey), arguments.call);
+  return call.Run(
+      [&](const Quorlin::SecurityTokenService& service) { return service.AcquireTokenByCertificate(spec); });
 }
 
 TokenPointer AcquireByToken(const AcquireArguments& arguments) {
@@ -58,13 +59,15 @@ TokenPointer AcquireByToken(const AcquireArguments& arguments) {
       MakeServiceConfig(arguments.service, arguments.holderOfKey);
   const TokenPointer presented = ReadToken(arguments.presentedTokenFile, config);
   const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
-  const Progress progress;
-  return Quorlin::CreateSecurityTokenService(config)->AcquireTokenByToken(*presented, spec);
+  return ServiceCall(config, arguments.call).Run([&](const Quorlin::SecurityTokenService& service) {
+    return service.AcquireTokenByToken(*presented, spec);
+  });
 }
 
 /// Adds the flags that all have.
 void AddCommonOptions(CLI::App& command, bool needsKey, AcquireArguments& arguments) {
   AddServiceOptions(command, arguments.service);
+  AddCallOptions(command, arguments.call);
   AddHolderOfKeyOptions(command, arguments.holderOfKey, needsKey);
   AddTokenOptions(command, arguments.token);
   AddOutputOptions(command, arguments.output);

@@ -7,7 +7,7 @@
 #include "quorlin/Kerberos.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
-#include "quorlin/Progress.h"
+#include "quorlin/ServiceCall.h"
 
 #include <pelmar/http/Url.h>
 #include <quorlin/SecurityTokenService.h>
@@ -20,6 +20,7 @@ namespace {
 
 struct GssArguments {
   ServiceOptions service;
+  CallOptions call;
   HolderOfKeyOptions holderOfKey;
   TokenOptions token;
   OutputOptions output;
@@ -36,12 +37,12 @@ KerberosOptions MakeKerberosOptions(const GssArguments& arguments) {
 
 boost::shared_ptr<const Quorlin::SamlToken> AcquireByGss(const GssArguments& arguments) {
   RequireKerberos();
-  const boost::shared_ptr<Quorlin::SecurityTokenService> service =
-      Quorlin::CreateSecurityTokenService(MakeServiceConfig(arguments.service, arguments.holderOfKey));
+  const ServiceCall call(MakeServiceConfig(arguments.service, arguments.holderOfKey), arguments.call);
   const Quorlin::TokenSpec spec = MakeTokenSpec(arguments.token);
   const KerberosOptions kerberos = MakeKerberosOptions(arguments);
-  const Progress progress;
-  return AcquireByKerberos(*service, spec, kerberos);
+  return call.Run([&](const Quorlin::SecurityTokenService& service) {
+    return AcquireByKerberos(service, spec, kerberos);
+  });
 }
 
 void AddKerberosOptions(CLI::App& command, KerberosOptions& options) {
@@ -67,6 +68,7 @@ Command AddAcquireGssCommand(CLI::App& acquire) {
       acquire.add_subcommand("gss", "Get a token for the owner of a Kerberos ticket (SPNEGO)");
   AddKerberosOptions(*command, arguments->kerberos);
   AddServiceOptions(*command, arguments->service);
+  AddCallOptions(*command, arguments->call);
   AddHolderOfKeyOptions(*command, arguments->holderOfKey, false);
   AddTokenOptions(*command, arguments->token);
   AddOutputOptions(*command, arguments->output);

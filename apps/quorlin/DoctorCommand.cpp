@@ -155,11 +155,7 @@ void AddOptions(CLI::App& command, DoctorArguments& arguments) {
       command, "--ca", arguments.service.caFiles,
       "Trust the TLS servers of these authorities; without it, those the system trusts. May be repeated")
       ->type_name("PEM");
-  AddRepeatable(
-      command, "--pin", arguments.pins,
-      "Demand that the TLS server's key is this one, or one of these: sha256// and the base64 SHA-256 of the "
-      "public key. May be repeated")
-      ->type_name("PIN");
+  AddPinOption(command, arguments.pins);
   AddHolderOfKeyOptions(command, arguments.holderOfKey, false);
   command
       .add_option(

@@ -20,17 +20,6 @@ bool HasScheme(const std::string& url, const std::string& scheme) {
   return Pelmar::StringUtil::ToLower(url.substr(0, scheme.size())) == scheme;
 }
 
-Pelmar::Ref<Pelmar::Ssl::SSLContext> MakeSslContext(const ServiceOptions& options) {
-  Pelmar::Ssl::SSLContextOptions contextOptions;
-  contextOptions.trustAnchors = ReadCertificates(options.caFiles);
-  contextOptions.useSystemStore = options.caFiles.empty();
-  try {
-    return Pelmar::Ssl::CreateSSLContext(contextOptions);
-  } catch (const Pelmar::Crypto::CryptoException& e) {
-    throw UsageException(std::string("cannot set up TLS: ") + e.what());
-  }
-}
-
 Pelmar::Ref<const Pelmar::Crypto::PrivateKey> ReadKey(const HolderOfKeyOptions& options) {
   const Secret pem = ReadKeyFile(options.keyFile);
   try {
@@ -42,6 +31,50 @@ Pelmar::Ref<const Pelmar::Crypto::PrivateKey> ReadKey(const HolderOfKeyOptions& 
   } catch (const Pelmar::Crypto::CryptoException& e) {
     throw UsageException("cannot use the key in " + options.keyFile + ": " + e.what());
   }
+}
+
+Pelmar::Ref<Pelmar::Ssl::SSLContext> MakeSslContext(const ServiceOptions& options) {
+  Pelmar::Ssl::SSLContextOptions contextOptions;
+  contextOptions.trustAnchors = ReadCertificates(options.caFiles);
+  contextOptions.useSystemStore = options.caFiles.empty();
+  if (!options.tlsIdentity.keyFile.empty()) {
+    contextOptions.clientKey = ReadKey(options.tlsIdentity);
+    // The first is the client's own; others stand between it and an authority.
+    contextOptions.clientCertificateChain = ReadCertificates({options.tlsIdentity.certificateFile});
+    contextOptions.clientCertificate = contextOptions.clientCertificateChain.front();
+    contextOptions.clientCertificateChain.pop_front();
+  }
+  try {
+    return Pelmar::Ssl::CreateSSLContext(contextOptions);
+  } catch (const Pelmar::Crypto::CryptoException& e) {
+    throw UsageException(std::string("cannot set up TLS: ") + e.what());
+  }
+}
+
+/// The pins as the library wants them.
+std::string Join(const std::vector<std::string>& pins) {
+  std::string all;
+  for (const std::string& pin : pins) {
+    all += (all.empty() ? "" : ";") + pin;
+  }
+  return all;
+}
+
+void AddTlsIdentityOptions(CLI::App& command, HolderOfKeyOptions& options) {
+  CLI::Option* const certificate =
+      command
+          .add_option("--client-cert", options.certificateFile,
+                      "Your certificate for TLS, perhaps followed by those of its issuers")
+          ->type_name("PEM");
+  CLI::Option* const key =
+      command.add_option("--client-key", options.keyFile, "Its private key")->type_name("PEM");
+  certificate->needs(key);
+  key->needs(certificate);
+  command
+      .add_option("--client-key-password-file", options.keyPasswordFile,
+                  "The pass phrase of an encrypted --client-key")
+      ->needs(key)
+      ->type_name("FILE");
 }
 
 }  // namespace
@@ -60,7 +93,17 @@ void AddServiceOptions(CLI::App& command, ServiceOptions& options) {
       command, "--ca", options.caFiles,
       "Trust the TLS servers of these authorities; without it, those the system trusts. May be repeated")
       ->type_name("PEM");
+  AddPinOption(command, options.pins);
   AddStsCertificateOption(command, options.stsCertificateFiles);
+  AddTlsIdentityOptions(command, options.tlsIdentity);
+}
+
+void AddPinOption(CLI::App& command, std::vector<std::string>& pins) {
+  AddRepeatable(
+      command, "--pin", pins,
+      "Demand that the TLS server's key is this one, or one of these: sha256// and the base64 SHA-256 of the "
+      "public key. May be repeated")
+      ->type_name("PIN");
 }
 
 void AddStsCertificateOption(CLI::App& command, std::vector<std::string>& files) {
@@ -90,6 +133,11 @@ Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& opti
   config.trustedStsCertificates = ReadCertificates(options.stsCertificateFiles);
   if (!IsPlainHttp(options)) {
     config.sslContext = MakeSslContext(options);
+    config.sslConnectionParam = Join(options.pins);
+  } else if (!options.pins.empty()) {
+    throw UsageException("--pin needs an https: URL");
+  } else if (!options.tlsIdentity.keyFile.empty()) {
+    throw UsageException("--client-cert needs an https: URL");
   }
   config.holderOfKeyConfig = MakeHolderOfKeyConfig(holderOfKey);
   return config;

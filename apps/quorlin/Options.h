@@ -18,21 +18,27 @@
 
 namespace Cli {
 
-/// Which service, and what to trust.
-struct ServiceOptions {
-  std::string url;
-  std::vector<std::string> caFiles;
-  std::vector<std::string> stsCertificateFiles;
-};
-
-void AddServiceOptions(CLI::App& command, ServiceOptions& options);
-
-/// The client's own key, to sign requests with and to bind tokens to.
+/// A key of the client's own: to sign requests with and to bind tokens to, or for TLS.
 struct HolderOfKeyOptions {
   std::string certificateFile;
   std::string keyFile;
   std::string keyPasswordFile;
 };
+
+/// Which service, what to trust, and who says so to its TLS.
+struct ServiceOptions {
+  std::string url;
+  std::vector<std::string> caFiles;
+  std::vector<std::string> pins;
+  std::vector<std::string> stsCertificateFiles;
+  HolderOfKeyOptions tlsIdentity;
+};
+
+/// Adds --url, --ca, --pin, --sts-cert, --client-cert, --client-key and --client-key-password-file.
+void AddServiceOptions(CLI::App& command, ServiceOptions& options);
+
+/// Adds --pin.
+void AddPinOption(CLI::App& command, std::vector<std::string>& pins);
 
 /// Adds --cert, --key and --key-password-file. The first two are wanted together, or always when `required`.
 void AddHolderOfKeyOptions(CLI::App& command, HolderOfKeyOptions& options, bool required);
@@ -44,7 +50,7 @@ void AddStsCertificateOption(CLI::App& command, std::vector<std::string>& files)
 boost::optional<Quorlin::HolderOfKeyConfig> MakeHolderOfKeyConfig(const HolderOfKeyOptions& options);
 
 /// Reads the files. An https: URL without --ca trusts what the operating system trusts. Throws
-/// UsageException.
+/// UsageException, also for what makes no sense without https:.
 Quorlin::SecurityTokenServiceConfig MakeServiceConfig(
     const ServiceOptions& options, const HolderOfKeyOptions& holderOfKey = HolderOfKeyOptions());
 

@@ -6,7 +6,7 @@
 #include "quorlin/Commands.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
-#include "quorlin/Progress.h"
+#include "quorlin/ServiceCall.h"
 #include "quorlin/TokenFile.h"
 
 #include <quorlin/SecurityTokenService.h>
@@ -19,6 +19,7 @@ namespace {
 
 struct RenewArguments {
   ServiceOptions service;
+  CallOptions call;
   HolderOfKeyOptions holderOfKey;
   TokenOptions token;
   OutputOptions output;
@@ -29,8 +30,9 @@ boost::shared_ptr<const Quorlin::SamlToken> Renew(const RenewArguments& argument
   const Quorlin::SecurityTokenServiceConfig config =
       MakeServiceConfig(arguments.service, arguments.holderOfKey);
   const boost::shared_ptr<const Quorlin::SamlToken> token = ReadToken(arguments.tokenFile, config);
-  const Progress progress;
-  return Quorlin::CreateSecurityTokenService(config)->RenewToken(*token, arguments.token.lifetimeSec);
+  return ServiceCall(config, arguments.call).Run([&](const Quorlin::SecurityTokenService& service) {
+    return service.RenewToken(*token, arguments.token.lifetimeSec);
+  });
 }
 
 }  // namespace
@@ -41,6 +43,7 @@ Command AddRenewCommand(CLI::App& app) {
       app.add_subcommand("renew", "Get a new lifetime for a token that is bound to your key");
   AddTokenFileOption(*command, arguments->tokenFile);
   AddServiceOptions(*command, arguments->service);
+  AddCallOptions(*command, arguments->call);
   AddHolderOfKeyOptions(*command, arguments->holderOfKey, true);
   AddLifetimeOption(*command, arguments->token);
   AddOutputOptions(*command, arguments->output);

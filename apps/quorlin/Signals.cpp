@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <atomic>
 #include <cerrno>
 #include <cstdint>
 #include <system_error>
@@ -29,6 +30,29 @@ void TakeEffect(int number) {
   signal(number, SIG_DFL);
   pthread_sigmask(SIG_UNBLOCK, &one, nullptr);
   raise(number);
+}
+
+/// The signal that came to an Interruption; 0: none.
+std::atomic<int> interruptedBy(0);
+
+/// Waits for a signal; its number, or 0 when `end` was written to.
+int WaitForSignal(int signals, int end) {
+  std::array<pollfd, 2> wanted = {pollfd{signals, POLLIN, 0}, pollfd{end, POLLIN, 0}};
+  while (poll(wanted.data(), wanted.size(), -1) < 0 && errno == EINTR) {
+  }
+  signalfd_siginfo info;
+  const bool hasSignal = wanted[1].revents == 0 && read(signals, &info, sizeof(info)) == sizeof(info);
+  return hasSignal ? static_cast<int>(info.ssi_signo) : 0;
+}
+
+/// Has the thread that waits at `end` come back.
+void EndThread(int end, std::thread& thread) {
+  const std::uint64_t one = 1;
+  if (write(end, &one, sizeof(one)) == sizeof(one)) {
+    thread.join();
+  } else {
+    thread.detach();
+  }
 }
 
 }  // namespace
@@ -59,24 +83,47 @@ StopWatch::StopWatch(const StopSignals& signals, const std::function<void()>& cl
 }
 
 StopWatch::~StopWatch() {
-  const std::uint64_t one = 1;
-  if (write(_end, &one, sizeof(one)) == sizeof(one)) {
-    _thread.join();
-  } else {
-    _thread.detach();
-  }
+  EndThread(_end, _thread);
   close(_signals);
   close(_end);
 }
 
 void StopWatch::Watch() const {
-  std::array<pollfd, 2> wanted = {pollfd{_signals, POLLIN, 0}, pollfd{_end, POLLIN, 0}};
-  while (poll(wanted.data(), wanted.size(), -1) < 0 && errno == EINTR) {
-  }
-  signalfd_siginfo info;
-  if (wanted[1].revents == 0 && read(_signals, &info, sizeof(info)) == sizeof(info)) {
+  if (const int number = WaitForSignal(_signals, _end)) {
     _cleanUp();
-    TakeEffect(static_cast<int>(info.ssi_signo));
+    TakeEffect(number);
+  }
+}
+
+Interruption::Interruption(const std::function<void()>& cancel)
+    : _signals(signalfd(-1, &_held.Get(), SFD_CLOEXEC)), _end(eventfd(0, EFD_CLOEXEC)), _cancel(cancel) {
+  if (_signals < 0 || _end < 0) {
+    ThrowErrno("cannot wait for signals");
+  }
+  _thread = std::thread([this] { Watch(); });
+}
+
+Interruption::~Interruption() {
+  EndThread(_end, _thread);
+  close(_signals);
+  close(_end);
+}
+
+void Interruption::Watch() const {
+  const int first = WaitForSignal(_signals, _end);
+  if (first == 0) {
+    return;
+  }
+  interruptedBy = first;
+  _cancel();
+  if (const int second = WaitForSignal(_signals, _end)) {
+    TakeEffect(second);
+  }
+}
+
+void EndByInterruption() {
+  if (interruptedBy != 0) {
+    TakeEffect(interruptedBy);
   }
 }
 

@@ -51,6 +51,29 @@ class StopWatch final {
   std::thread _thread;
 };
 
+/// While it lives, the first of those signals calls `cancel`, on a thread of its own, and no more; a second
+/// one ends the program at once. Make it before anything that starts threads.
+class Interruption final {
+ public:
+  explicit Interruption(const std::function<void()>& cancel);
+  Interruption(const Interruption&) = delete;
+  Interruption& operator=(const Interruption&) = delete;
+  ~Interruption();
+
+ private:
+  void Watch() const;
+
+  const StopSignals _held;
+  int _signals;
+  int _end;
+  std::function<void()> _cancel;
+  std::thread _thread;
+};
+
+/// If a signal came to an Interruption, has it take its effect now, which ends the program. For when all is
+/// tidied up and said.
+void EndByInterruption();
+
 }  // namespace Cli
 
 #endif  // QUORLIN_CLI_SIGNALS_H

@@ -6,7 +6,7 @@
 #include "quorlin/Commands.h"
 #include "quorlin/Options.h"
 #include "quorlin/Outcome.h"
-#include "quorlin/Progress.h"
+#include "quorlin/ServiceCall.h"
 #include "quorlin/Terminal.h"
 #include "quorlin/TokenFile.h"
 #include "quorlin/TokenOutput.h"
@@ -21,6 +21,7 @@ namespace {
 
 struct ValidateArguments {
   ServiceOptions service;
+  CallOptions call;
   std::string tokenFile;
   bool json = false;
 };
@@ -34,16 +35,14 @@ std::string DescribeVerdict(const Quorlin::SamlToken& token, bool isValid, bool 
          (isValid ? " is a valid subject\n" : " is no longer a valid subject\n");
 }
 
-bool AskService(const Quorlin::SecurityTokenServiceConfig& config, const Quorlin::SamlToken& token) {
-  const Progress progress;
-  return Quorlin::CreateSecurityTokenService(config)->ValidateSubject(token);
-}
-
 int Validate(const ValidateArguments& arguments) {
   try {
     const Quorlin::SecurityTokenServiceConfig config = MakeServiceConfig(arguments.service);
     const boost::shared_ptr<const Quorlin::SamlToken> token = ReadToken(arguments.tokenFile, config);
-    const bool isValid = AskService(config, *token);
+    const bool isValid =
+        ServiceCall(config, arguments.call).Run([&](const Quorlin::SecurityTokenService& service) {
+          return service.ValidateSubject(*token);
+        });
     Print(DescribeVerdict(*token, isValid, arguments.json));
     return isValid ? EXIT_DONE : EXIT_REFUSED;
   } catch (...) {
@@ -59,6 +58,7 @@ Command AddValidateCommand(CLI::App& app) {
       app.add_subcommand("validate", "Ask the token service whether a token's subject is still a valid one");
   AddTokenFileOption(*command, arguments->tokenFile);
   AddServiceOptions(*command, arguments->service);
+  AddCallOptions(*command, arguments->call);
   command->add_flag("--json", arguments->json, "Print {\"subjectValid\":true} or {\"subjectValid\":false}");
   AddLogOption(*command);
   command->footer(

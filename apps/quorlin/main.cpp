@@ -5,6 +5,7 @@
 #include "quorlin/Commands.h"
 #include "quorlin/CoreDumps.h"
 #include "quorlin/ExitCode.h"
+#include "quorlin/Signals.h"
 #include "quorlin/Terminal.h"
 
 #include <CLI/CLI.hpp>
@@ -110,14 +111,16 @@ int Run(int argumentCount, char** arguments) {
 }  // namespace
 
 int main(int argumentCount, char** arguments) {
+  int exitCode = Cli::EXIT_FAILED;
   try {
     if (!Cli::ForbidCoreDumps()) {
       // Said, but no reason to do nothing at all.
       std::cerr << "quorlin: warning: core dumps cannot be switched off, and would hold passwords and keys\n";
     }
-    return Run(argumentCount, arguments);
+    exitCode = Run(argumentCount, arguments);
   } catch (const std::exception& e) {
     std::cerr << "quorlin: " << Cli::MakePrintable(e.what()) << "\n";
-    return Cli::EXIT_FAILED;
   }
+  Cli::EndByInterruption();
+  return exitCode;
 }

@@ -151,8 +151,8 @@ TEST(CliConnection, ClientCertificateDemanded) {
   EXPECT_EQ(
       FailWithServer(settings),
       "quorlin: PEER demands a client certificate (CommunicationException)\n"
-      "The service wants TLS with a client certificate, which this program does not offer: ask for another "
-      "address.\n");
+      "The service wants TLS with a client certificate: calls take yours as --client-cert and "
+      "--client-key.\n");
 }
 
 TEST(CliConnection, OldTls) {
@@ -241,7 +241,7 @@ TEST(CliConnection, OtherStatuses) {
       {"405 Method Not Allowed",
        "Correct the path in --url: something else than a token service may answer there."},
       {"407 Proxy Authentication Required",
-       "A proxy wants a login; this program talks to the service itself only."},
+       "The proxy wants a login: give it one with --proxy-user and --proxy-password-file."},
       {"502 Bad Gateway", "A gateway before the service has no service behind it now: try again later."},
       {"503 Service Unavailable",
        "A gateway before the service has no service behind it now: try again later."},

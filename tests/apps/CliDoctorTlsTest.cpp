@@ -374,8 +374,8 @@ TEST(CliDoctorTls, LeavesTheVerdictOnAMissingClientCertificateToTheLibrary) {
           StepsNotReachedAfter("http") +
           FailureText(
               "http",
-              "The service wants TLS with a client certificate, which this program does not offer: ask for "
-              "another address."));
+              "The service wants TLS with a client certificate: calls take yours as --client-cert and "
+              "--client-key."));
 }
 
 }  // namespace

@@ -396,6 +396,10 @@ TEST(HttpProxy, TellsWhyItOpensNoWay) {
             CallThrough(AnswerConnect("407 Proxy Authentication Required")));
   EXPECT_EQ("HttpException: Proxy PROXY refused the credentials",
             CallThrough(AnswerConnect("407 Proxy Authentication Required"), "alice"));
+  EXPECT_EQ("HttpException: Proxy PROXY refused the credentials",
+            CallThrough(AnswerConnect("401 Unauthorized"), "alice"));
+  EXPECT_EQ("HttpException: Proxy PROXY opens no way to the service: it answered 401",
+            CallThrough(AnswerConnect("401 Unauthorized")));
 }
 
 TEST(HttpProxy, MayBreakOff) {

@@ -166,13 +166,18 @@ std::string DescribeConnectFailure(const TransferFacts& facts) {
 
 /// What the proxy had against opening a way to the server; empty when it was nothing.
 std::string DescribeProxyRefusal(const TransferFacts& facts) {
+  constexpr int kUnauthorized = 401;  // Some proxies' word for credentials that are wrong.
   constexpr int kProxyAuthenticationRequired = 407;
   if (facts.proxyStatus == 0 || facts.proxyStatus / 100 == 2) {
     return std::string();
   }
   const std::string proxy = "Proxy " + facts.proxyEndpoint;
+  if (facts.hasProxyCredentials &&
+      (facts.proxyStatus == kProxyAuthenticationRequired || facts.proxyStatus == kUnauthorized)) {
+    return proxy + " refused the credentials";
+  }
   if (facts.proxyStatus == kProxyAuthenticationRequired) {
-    return proxy + (facts.hasProxyCredentials ? " refused the credentials" : " demands credentials");
+    return proxy + " demands credentials";
   }
   return proxy + " opens no way to the service: it answered " + std::to_string(facts.proxyStatus);
 }
