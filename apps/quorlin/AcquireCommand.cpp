@@ -107,9 +107,15 @@ Command AddCertificateCommand(CLI::App& acquire) {
       acquire.add_subcommand("certificate", "Get a token for the owner of a certificate");
   AddCommonOptions(*command, true, *arguments);
   command->footer(
-      "Example:\n"
+      "The key is a PEM file, an object in a PKCS #11 token or part of a PKCS #12 file. The PIN or the pass phrase is\n"
+      "asked for on the terminal unless --key-password-file holds it.\n\n"
+      "Examples:\n"
       "  quorlin acquire certificate --url https://sts.example.com/sts --sts-cert sts.pem \\\n"
-      "      --cert me.pem --key me.key --out token.xml");
+      "      --cert me.pem --key me.key --out token.xml\n"
+      "  quorlin acquire certificate --url https://sts.example.com/sts --sts-cert sts.pem \\\n"
+      "      --cert me.pem --key 'pkcs11:token=mine;object=sign' --out token.xml\n"
+      "  quorlin acquire certificate --url https://sts.example.com/sts --sts-cert sts.pem \\\n"
+      "      --pkcs12 me.p12 --out token.xml");
   return MakeCommand(command, arguments, AcquireByCertificate);
 }
 

@@ -6,7 +6,6 @@
 #include "quorlin/AdviceFile.h"
 #include "quorlin/Failure.h"
 #include "quorlin/Files.h"
-#include "quorlin/Password.h"
 
 #include <pelmar/StringUtil.h>
 #include <pelmar/crypto/CryptoException.h>
@@ -20,25 +19,12 @@ bool HasScheme(const std::string& url, const std::string& scheme) {
   return Pelmar::StringUtil::ToLower(url.substr(0, scheme.size())) == scheme;
 }
 
-Pelmar::Ref<const Pelmar::Crypto::PrivateKey> ReadKey(const HolderOfKeyOptions& options) {
-  const Secret pem = ReadKeyFile(options.keyFile);
-  try {
-    if (options.keyPasswordFile.empty()) {
-      return Pelmar::Crypto::CreatePrivateKeyFromPem(pem.Reveal());
-    }
-    return Pelmar::Crypto::CreatePrivateKeyFromPem(pem.Reveal(),
-                                                   ReadSecretFile(options.keyPasswordFile).Reveal());
-  } catch (const Pelmar::Crypto::CryptoException& e) {
-    throw UsageException("cannot use the key in " + options.keyFile + ": " + e.what());
-  }
-}
-
 Pelmar::Ref<Pelmar::Ssl::SSLContext> MakeSslContext(const ServiceOptions& options) {
   Pelmar::Ssl::SSLContextOptions contextOptions;
   contextOptions.trustAnchors = ReadCertificates(options.caFiles);
   contextOptions.useSystemStore = options.caFiles.empty();
-  if (!options.tlsIdentity.keyFile.empty()) {
-    contextOptions.clientKey = ReadKey(options.tlsIdentity);
+  if (!options.tlsIdentity.key.empty()) {
+    contextOptions.clientKey = ReadPemKey(options.tlsIdentity);
     // The first is the client's own; others stand between it and an authority.
     contextOptions.clientCertificateChain = ReadCertificates({options.tlsIdentity.certificateFile});
     contextOptions.clientCertificate = contextOptions.clientCertificateChain.front();
@@ -67,7 +53,7 @@ void AddTlsIdentityOptions(CLI::App& command, HolderOfKeyOptions& options) {
                       "Your certificate for TLS, perhaps followed by those of its issuers")
           ->type_name("PEM");
   CLI::Option* const key =
-      command.add_option("--client-key", options.keyFile, "Its private key")->type_name("PEM");
+      command.add_option("--client-key", options.key, "Its private key")->type_name("PEM");
   certificate->needs(key);
   key->needs(certificate);
   command
@@ -113,19 +99,6 @@ void AddStsCertificateOption(CLI::App& command, std::vector<std::string>& files)
       ->type_name("PEM");
 }
 
-void AddHolderOfKeyOptions(CLI::App& command, HolderOfKeyOptions& options, bool required) {
-  CLI::Option* const certificate =
-      command.add_option("--cert", options.certificateFile, "Your certificate")->type_name("PEM");
-  CLI::Option* const key =
-      command.add_option("--key", options.keyFile, "Its private key, which signs the request")
-          ->type_name("PEM");
-  certificate->needs(key)->required(required);
-  key->needs(certificate)->required(required);
-  command.add_option("--key-password-file", options.keyPasswordFile, "The pass phrase of an encrypted --key")
-      ->needs(key)
-      ->type_name("FILE");
-}
-
 Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& options,
                                                       const HolderOfKeyOptions& holderOfKey) {
   Quorlin::SecurityTokenServiceConfig config;
@@ -136,21 +109,11 @@ Quorlin::SecurityTokenServiceConfig MakeServiceConfig(const ServiceOptions& opti
     config.sslConnectionParam = Join(options.pins);
   } else if (!options.pins.empty()) {
     throw UsageException("--pin needs an https: URL");
-  } else if (!options.tlsIdentity.keyFile.empty()) {
+  } else if (!options.tlsIdentity.key.empty()) {
     throw UsageException("--client-cert needs an https: URL");
   }
   config.holderOfKeyConfig = MakeHolderOfKeyConfig(holderOfKey);
   return config;
-}
-
-boost::optional<Quorlin::HolderOfKeyConfig> MakeHolderOfKeyConfig(const HolderOfKeyOptions& options) {
-  if (options.keyFile.empty()) {
-    return boost::none;
-  }
-  Quorlin::HolderOfKeyConfig identity;
-  identity.privateKey = ReadKey(options);
-  identity.certificate = ReadCertificates({options.certificateFile}).front();
-  return identity;
 }
 
 bool IsPlainHttp(const ServiceOptions& options) {

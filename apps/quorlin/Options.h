@@ -21,7 +21,8 @@ namespace Cli {
 /// A key of the client's own: to sign requests with and to bind tokens to, or for TLS.
 struct HolderOfKeyOptions {
   std::string certificateFile;
-  std::string keyFile;
+  std::string key;  ///< A PEM file or a PKCS #11 URI.
+  std::string pkcs12File;
   std::string keyPasswordFile;
 };
 
@@ -40,13 +41,18 @@ void AddServiceOptions(CLI::App& command, ServiceOptions& options);
 /// Adds --pin.
 void AddPinOption(CLI::App& command, std::vector<std::string>& pins);
 
-/// Adds --cert, --key and --key-password-file. The first two are wanted together, or always when `required`.
+/// Adds --cert, --key, --pkcs12 and --key-password-file. The first two are wanted together; these two or
+/// --pkcs12 always when `required`. `options` must live as long as `command`.
 void AddHolderOfKeyOptions(CLI::App& command, HolderOfKeyOptions& options, bool required);
 
 /// Adds --sts-cert.
 void AddStsCertificateOption(CLI::App& command, std::vector<std::string>& files);
 
-/// Reads the files; nothing when none are named. Throws UsageException.
+/// The key in the PEM file that `options` names as its key. Throws UsageException.
+Pelmar::Ref<const Pelmar::Crypto::PrivateKey> ReadPemKey(const HolderOfKeyOptions& options);
+
+/// Reads the files; nothing when none are named. The pass phrase of a PKCS #12 file and the PIN of a token
+/// are asked for on the terminal when no file holds them. Throws UsageException.
 boost::optional<Quorlin::HolderOfKeyConfig> MakeHolderOfKeyConfig(const HolderOfKeyOptions& options);
 
 /// Reads the files. An https: URL without --ca trusts what the operating system trusts. Throws

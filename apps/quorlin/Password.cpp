@@ -145,25 +145,6 @@ class HiddenEcho final {
   termios _settings;
 };
 
-Secret AskOnTerminal(const std::string& userName) {
-  const Descriptor terminal(open("/dev/tty", O_RDWR | O_NOCTTY | O_CLOEXEC));
-  if (terminal.Get() < 0) {
-    throw UsageException(
-        "there is no terminal to ask for the password: use --password-file or --password-stdin");
-  }
-  PasswordBuffer buffer;
-  // Destroyed in reverse: first the echo comes back, then the signals.
-  const HeldSignals signals;
-  const HiddenEcho echo(terminal.Get());
-  const std::string prompt = "Password of " + MakePrintable(userName) + ": ";
-  if (write(terminal.Get(), prompt.data(), prompt.size()) < 0) {
-    throw UsageException(std::string("cannot write to the terminal: ") + std::strerror(errno));
-  }
-  while (!buffer.HasLine() && signals.WaitForInput(terminal.Get()) && buffer.ReadFrom(terminal.Get())) {
-  }
-  return buffer.TakePassword();
-}
-
 }  // namespace
 
 void AddPasswordOptions(CLI::App& command, PasswordOptions& options) {
@@ -188,7 +169,29 @@ Secret ReadPassword(const PasswordOptions& options, const std::string& userName)
   if (options.fromStdin) {
     return ReadToEnd(STDIN_FILENO);
   }
-  return options.file.empty() ? AskOnTerminal(userName) : ReadSecretFile(options.file);
+  return options.file.empty()
+             ? AskOnTerminal(
+                   "Password of " + MakePrintable(userName),
+                   "there is no terminal to ask for the password: use --password-file or --password-stdin")
+             : ReadSecretFile(options.file);
+}
+
+Secret AskOnTerminal(const std::string& name, const std::string& noTerminal) {
+  const Descriptor terminal(open("/dev/tty", O_RDWR | O_NOCTTY | O_CLOEXEC));
+  if (terminal.Get() < 0) {
+    throw UsageException(noTerminal);
+  }
+  PasswordBuffer buffer;
+  // Destroyed in reverse: first the echo comes back, then the signals.
+  const HeldSignals signals;
+  const HiddenEcho echo(terminal.Get());
+  const std::string prompt = name + ": ";
+  if (write(terminal.Get(), prompt.data(), prompt.size()) < 0) {
+    throw UsageException(std::string("cannot write to the terminal: ") + std::strerror(errno));
+  }
+  while (!buffer.HasLine() && signals.WaitForInput(terminal.Get()) && buffer.ReadFrom(terminal.Get())) {
+  }
+  return buffer.TakePassword();
 }
 
 Secret ReadSecretFile(const std::string& path) {

@@ -29,10 +29,14 @@ struct PasswordOptions {
 void AddPasswordOptions(CLI::App& command, PasswordOptions& options);
 
 /// Reads the password of `userName`. From a file or from standard input all bytes count but one line feed (or
-/// carriage return and line feed) at the end. On a terminal it is asked for without echo; the terminal's
-/// settings are restored also when a signal ends the program. Throws UsageException when there is none, or no
-/// way to ask for it.
+/// carriage return and line feed) at the end. On a terminal it is asked for (AskOnTerminal). Throws
+/// UsageException when there is none, or no way to ask for it.
 Secret ReadPassword(const PasswordOptions& options, const std::string& userName);
+
+/// Asks on the terminal, without echo, for what `name` says, which must be printable ("PIN of the token");
+/// the terminal's settings are restored also when a signal ends the program. Throws UsageException: without a
+/// terminal with the message `noTerminal`.
+Secret AskOnTerminal(const std::string& name, const std::string& noTerminal);
 
 /// A password or pass phrase from a file, without one line end. Throws UsageException.
 Secret ReadSecretFile(const std::string& path);

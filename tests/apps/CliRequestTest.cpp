@@ -411,9 +411,9 @@ const Refused kRefused[] = {
      "there; use --password-file, --password-stdin or the prompt (and change that password)\n"
      "Try quorlin request password --help\n"},
     {"CertificateWithoutKey", kCertificate, 2,
-     "quorlin: --cert is required\nTry quorlin request certificate --help\n"},
+     "quorlin: --cert or --pkcs12 is required\nTry quorlin request certificate --help\n"},
     {"BearerByCertificate", Join(kCertificate, {"--bearer"}), 2,
-     "quorlin: --cert is required\nTry quorlin request certificate --help\n"},
+     "quorlin: --cert or --pkcs12 is required\nTry quorlin request certificate --help\n"},
     {"NoLifetime",
      {"password", "--user", "a", "--lifetime", "0"},
      2,

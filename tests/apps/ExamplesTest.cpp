@@ -133,6 +133,12 @@ class RobotWorld final {
             std::to_string(lifetimeSec)};
   }
 
+  /// Lets another program sign with the key in this file.
+  ProcessResult AcquireWithKeyService(const std::string& keyFile) const {
+    return _world.RunClient("acquireWithKeyService",
+                            {_world.GetPath("cert.pem"), "openssl", "dgst", "-sha256", "-sign", keyFile}, "");
+  }
+
   const TestSupport::Identity& GetIdentity() const { return _identity; }
   World& GetWorld() { return _world; }
 
@@ -195,6 +201,25 @@ TEST(Examples, AcquireByPasswordSaysWhyThereIsNoToken) {
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.standardOutput, "");
   EXPECT_EQ(result.standardError, "Authentication failed: Invalid user name or password\n");
+}
+
+TEST(Examples, AcquireWithKeyServiceLetsAnotherProgramSign) {
+  RobotWorld robot;
+  const ProcessResult result = robot.AcquireWithKeyService(robot.GetWorld().GetPath("key.pem"));
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(result.standardOutput, "acquired a token for {Name: robot; Domain:example.com}\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, AcquireWithKeyServiceSendsNothingThatAWrongKeySigned) {
+  RobotWorld robot;
+  const TestSupport::KeyPair other = TestSupport::KeyPair::Get(TestSupport::KeyKind::RSA_2048, 7);
+  const ProcessResult result =
+      robot.AcquireWithKeyService(robot.GetWorld().WriteFile("other.pem", other.ToPem()));
+  EXPECT_EQ(result.standardError,
+            "The signing function gave a value that the certificate's key does not verify\n");
+  EXPECT_EQ(result.standardOutput, "");
+  EXPECT_EQ(result.exitCode, 1);
 }
 
 TEST(Examples, RenewHolderOfKeyRenewsATokenThatWillSoonEnd) {

@@ -17,7 +17,7 @@ struct evp_pkey_st;
 namespace Pelmar {
 namespace Crypto {
 
-class PrivateKeyImpl final : public PrivateKey {
+class PrivateKeyImpl : public PrivateKey {
  public:
   /// Takes `key` over. Throws CryptoException when it is not good enough (KeyStrength.h); it is freed then
   /// too.
@@ -29,12 +29,13 @@ class PrivateKeyImpl final : public PrivateKey {
   /// OpenSSL's object, owned by this one.
   evp_pkey_st* GetKey() const noexcept { return _key.get(); }
 
+ protected:
+  ~PrivateKeyImpl() override;
+
  private:
   struct KeyDeleter {
     void operator()(evp_pkey_st* key) const noexcept;
   };
-
-  ~PrivateKeyImpl() override;
 
   std::unique_ptr<evp_pkey_st, KeyDeleter> _key;
   KeyType _type;

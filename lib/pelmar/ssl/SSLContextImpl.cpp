@@ -3,6 +3,7 @@
 
 #include "pelmar/ssl/SSLContextImpl.h"
 
+#include "pelmar/crypto/FunctionKey.h"
 #include "pelmar/crypto/OpenSslError.h"
 #include "pelmar/crypto/OpenSslHandles.h"
 #include "pelmar/ssl/TrustAnchors.h"
@@ -58,6 +59,9 @@ void RequireWholeIdentity(const SSLContextOptions& options) {
 
 // A key of another class would keep its secret to itself, and TLS could not sign with it.
 Ref<const Crypto::PrivateKeyImpl> ToPrivateKeyImpl(const Crypto::PrivateKey* key) {
+  if (dynamic_cast<const Crypto::FunctionKey*>(key) != nullptr) {
+    throw InvalidArgumentException("the client key signs by a function of the host, which TLS cannot use");
+  }
   const auto* const own = dynamic_cast<const Crypto::PrivateKeyImpl*>(key);
   if (own == nullptr) {
     throw InvalidArgumentException("the client key was not made by this platform");
