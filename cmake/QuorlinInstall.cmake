@@ -3,7 +3,7 @@
 #
 # The installed package: find_package(Quorlin) gives Quorlin::quorlin and Pelmar::pelmar, pkg-config gives quorlin and
 # pelmar. Two CMake packages, because the platform stands on its own. With the component gssapi there is Quorlin::gssapi
-# too, or quorlin-gssapi.
+# too, or quorlin-gssapi; with provider Quorlin::provider, or quorlin-provider.
 
 include(CMakePackageConfigHelpers)
 
@@ -47,6 +47,7 @@ endfunction()
 
 quorlin_install_library(pelmar_library pelmar Pelmar)
 quorlin_install_library(quorlin_library quorlin Quorlin)
+quorlin_install_target(quorlin_provider_library quorlin-provider Quorlin QuorlinProviderTargets provider)
 if(TARGET quorlin_gssapi_library)
   quorlin_install_target(quorlin_gssapi_library quorlin-gssapi Quorlin QuorlinGssapiTargets gssapi)
 endif()

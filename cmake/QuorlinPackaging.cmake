@@ -51,6 +51,12 @@ quorlin_package(runtime "libquorlin${PROJECT_VERSION_MAJOR}" libs
   "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens\nstrictly. These are the shared libraries.")
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_CONTROL_EXTRA "${PROJECT_BINARY_DIR}/package/triggers")
 
+quorlin_package(provider "libquorlin-provider${PROJECT_VERSION_MAJOR}" libs
+  "Token provider for the client library for WS-Trust token services"
+  "Keeps a SAML 2.0 token of a WS-Trust 1.3 token service at hand, and gets\nthe next one in time. This is the shared library.")
+set(CPACK_COMPONENT_PROVIDER_DEPENDS runtime)
+set(CPACK_DEBIAN_PROVIDER_PACKAGE_CONTROL_EXTRA "${PROJECT_BINARY_DIR}/package/triggers")
+
 if(TARGET quorlin_gssapi_library)
   quorlin_package(gssapi "libquorlin-gssapi${PROJECT_VERSION_MAJOR}" libs
     "Kerberos for the client library for WS-Trust token services"
@@ -62,7 +68,7 @@ endif()
 quorlin_package(development "libquorlin-dev" libdevel
   "Client library for WS-Trust token services (development files)"
   "Asks WS-Trust 1.3 token services for SAML 2.0 tokens and checks tokens\nstrictly. These are the headers and what CMake and pkg-config need.")
-set(CPACK_COMPONENT_DEVELOPMENT_DEPENDS runtime)
+set(CPACK_COMPONENT_DEVELOPMENT_DEPENDS runtime provider)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "libboost-dev")
 if(TARGET quorlin_gssapi_library)
   list(APPEND CPACK_COMPONENT_DEVELOPMENT_DEPENDS gssapi)

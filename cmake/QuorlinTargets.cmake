@@ -53,12 +53,14 @@ function(quorlin_target_defaults target)
   target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:quorlin_warnings> $<BUILD_INTERFACE:quorlin_hardening>)
 endfunction()
 
-# quorlin_library_face(<target> <name>): the shared (or, on request, static) library <name> as others see it, with the
-# headers of lib/public/<name> as its interface. Consumers need no more than C++11. What it exports is bounded by the
+# quorlin_library_face(<target> <name> [<base>]): the shared (or, on request, static) library <name> as others see it, with
+# the headers of lib/public/<name> as its interface, which are included by their path below <base>: lib/public if none is given. Consumers need no more than C++11. What it exports is bounded by the
 # exports.map beside its CMakeLists.txt.
 function(quorlin_library_face target name)
   file(GLOB_RECURSE headers CONFIGURE_DEPENDS "${PROJECT_SOURCE_DIR}/lib/public/${name}/*.h")
-  target_sources(${target} PUBLIC FILE_SET HEADERS BASE_DIRS "${PROJECT_SOURCE_DIR}/lib/public" FILES ${headers})
+  set(bases "${PROJECT_SOURCE_DIR}/lib/public" ${ARGN})
+  list(GET bases -1 base)
+  target_sources(${target} PUBLIC FILE_SET HEADERS BASE_DIRS "${base}" FILES ${headers})
   target_compile_features(${target} INTERFACE cxx_std_11)
   target_link_libraries(${target} PRIVATE $<BUILD_INTERFACE:quorlin_hardening>)
   set_target_properties(${target} PROPERTIES

@@ -20,7 +20,10 @@ def name_part(path):
     path = re.sub(r"^lib/(public/)?", "", path)
     if path.startswith("pelmar/"):
         return path.split("/")[1] if path.count("/") > 1 else "core"
-    return "gssapi" if path.startswith("quorlin-gssapi/") else "libquorlin"
+    for part in ("gssapi", "provider"):
+        if path.startswith(f"quorlin-{part}/"):
+            return part
+    return "libquorlin"
 
 
 def name_included(root, part, included):
@@ -32,7 +35,7 @@ def name_included(root, part, included):
         return name_part("apps/" + included)
     if first == "devsts":
         return "devsts"
-    return name_part("lib/" + included) if first in ("pelmar", "quorlin", "quorlin-gssapi") else ""
+    return name_part("lib/" + included) if first in ("pelmar", "quorlin", "quorlin-gssapi", "quorlin-provider") else ""
 
 
 def read_uses(root):

@@ -11,6 +11,7 @@
 #include <pelmar/xml/Node.h>
 #include <pelmar/xml/Parser.h>
 #include <quorlin-gssapi/GssapiNegotiation.h>
+#include <quorlin/TokenProvider.h>
 #include <quorlin/quorlin.h>
 
 #include <boost/make_shared.hpp>
@@ -31,6 +32,7 @@ extern boost::shared_ptr<const Quorlin::SamlToken> token;
 extern Quorlin::TokenSpec spec;
 extern Quorlin::TokenCompletion done;
 extern std::string user;
+extern boost::shared_ptr<Quorlin::TokenProvider> provider;
 extern std::string password;
 extern std::string target;
 extern std::string xml;

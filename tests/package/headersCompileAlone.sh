@@ -5,7 +5,7 @@
 # usage: headersCompileAlone.sh COMPILER FOLDER
 #
 # Compiles each header below FOLDER on its own, in every language version from C++11 on; every warning is an
-# error.
+# error. The token provider's headers have a folder of their own, and are included like the library's.
 set -euo pipefail
 
 export compiler=$1 folder=$2
@@ -13,7 +13,8 @@ readonly versions=(11 14 17 20)
 
 check() {
   local version=$1 header=$2
-  "$compiler" "-std=c++$version" -Wall -Wextra -Wpedantic -Werror -fsyntax-only -I "$folder" -include "$header" \
+  "$compiler" "-std=c++$version" -Wall -Wextra -Wpedantic -Werror -fsyntax-only -I "$folder" \
+    -I "$folder/quorlin-provider" -include "$header" \
     -x c++ /dev/null || {
     echo "$header does not compile alone as C++$version with $compiler" >&2
     return 1

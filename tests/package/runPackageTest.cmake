@@ -2,8 +2,8 @@
 # Copyright the Quorlin authors
 #
 # Installs the build tree BUILD_DIR below WORK_DIR and builds the project beside this script twice against what was
-# installed: with find_package and with pkg-config. Both programs have to run. CXX is the compiler. With GSSAPI the same
-# for the Kerberos component; without it, asking for it has to be refused.
+# installed: with find_package and with pkg-config. Both programs have to run. CXX is the compiler. The same for the token
+# provider, and with GSSAPI for the Kerberos component; without it, asking for it has to be refused.
 
 set(prefix "${WORK_DIR}/prefix")
 
@@ -40,18 +40,20 @@ function(build_with_pkg_config name)
 endfunction()
 
 set(ENV{PKG_CONFIG_PATH} "${prefix}/${LIBDIR}/pkgconfig")
-set(components "")
+set(components provider)
 if(GSSAPI)
-  set(components gssapi)
+  string(APPEND components ",gssapi")
 else()
   refuse_components(gssapi "This Quorlin was built without its component gssapi, which needs MIT Kerberos.")
 endif()
-refuse_components(toaster "Quorlin has no component 'toaster'; there is: gssapi.")
+refuse_components(toaster "Quorlin has no component 'toaster'; there are: gssapi, provider.")
 
 run(${configure} -B "${WORK_DIR}/build" "-DCOMPONENTS=${components}")
 run("${CMAKE_COMMAND}" --build "${WORK_DIR}/build")
 run("${WORK_DIR}/build/consumer")
 build_with_pkg_config(consumer quorlin pelmar)
+run("${WORK_DIR}/build/providerConsumer")
+build_with_pkg_config(providerConsumer quorlin-provider)
 if(GSSAPI)
   run("${WORK_DIR}/build/gssapiConsumer")
   build_with_pkg_config(gssapiConsumer quorlin-gssapi)
