@@ -27,6 +27,8 @@ std::vector<Command> AddAcquireCommands(CLI::App& app);
 Command AddAcquireGssCommand(CLI::App& acquire);
 /// renew
 Command AddRenewCommand(CLI::App& app);
+/// get-token
+Command AddGetTokenCommand(CLI::App& app);
 /// validate
 Command AddValidateCommand(CLI::App& app);
 /// verify

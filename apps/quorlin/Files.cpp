@@ -48,17 +48,6 @@ bool IsSpecialFile(const std::string& path) {
   return stat(path.c_str(), &status) == 0 && !S_ISREG(status.st_mode);
 }
 
-void WriteAll(int descriptor, const std::string& content, const std::string& path) {
-  std::size_t written = 0;
-  while (written < content.size()) {
-    const ssize_t count = write(descriptor, content.data() + written, content.size() - written);
-    if (count < 0 && errno != EINTR) {
-      Refuse("write", path, errno);
-    }
-    written += count > 0 ? static_cast<std::size_t>(count) : 0;
-  }
-}
-
 /// What the file seems to be instead of certificates; empty when that cannot be told.
 std::string GuessWhatElse(const std::string& content) {
   constexpr char kDerSequence = 0x30;
@@ -82,6 +71,17 @@ std::string GuessWhatElse(const std::string& content) {
 }
 
 }  // namespace
+
+void WriteAll(int descriptor, const std::string& content, const std::string& path) {
+  std::size_t written = 0;
+  while (written < content.size()) {
+    const ssize_t count = write(descriptor, content.data() + written, content.size() - written);
+    if (count < 0 && errno != EINTR) {
+      Refuse("write", path, errno);
+    }
+    written += count > 0 ? static_cast<std::size_t>(count) : 0;
+  }
+}
 
 void ReadFileInto(const std::string& path, std::size_t maxBytes, Pelmar::Writer& writer) {
   const Descriptor file(OpenForReading(path));

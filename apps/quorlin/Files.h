@@ -35,6 +35,9 @@ void RequireSize(const std::string& path, std::size_t size, std::size_t maxBytes
 /// be read.
 std::string ReadFileUpTo(const std::string& path, std::size_t maxBytes);
 
+/// Writes all of `content` to `descriptor`. Throws UsageException, naming `path`.
+void WriteAll(int descriptor, const std::string& content, const std::string& path);
+
 /// All certificates of all the files, each of which must hold one at least. Throws UsageException, naming the
 /// file.
 std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>> ReadCertificates(

@@ -70,6 +70,7 @@ int ReportUsage(const CLI::App& app, const std::string& what) {
 std::vector<Cli::Command> AddCommands(CLI::App& app) {
   std::vector<Cli::Command> commands = Cli::AddAcquireCommands(app);
   commands.push_back(Cli::AddRenewCommand(app));
+  commands.push_back(Cli::AddGetTokenCommand(app));
   commands.push_back(Cli::AddValidateCommand(app));
   commands.push_back(Cli::AddVerifyCommand(app));
   commands.push_back(Cli::AddInspectCommand(app));
