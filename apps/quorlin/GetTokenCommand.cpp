@@ -277,7 +277,7 @@ Command AddGetTokenCommand(CLI::App& app) {
   AddBearerOption(*command, arguments->acquisition.token);
   AddLogOption(*command);
   command->footer(
-      "The token is got by --user, by --gss, or else by --cert and --key; a renewable one that is bound to your key is\n"
+      "The token is got by --user, by --gss, or else by --cert and --key or --pkcs12; a renewable one that is bound to your key is\n"
       "renewed. The program of --exec finds the name of the token's file in the variable QUORLIN_TOKEN_FILE.\n\n"
       "Examples:\n"
       "  quorlin get-token --cache ~/.cache/files.xml --url https://sts.example.com/sts --sts-cert sts.pem \\\n"

@@ -277,7 +277,7 @@ TEST(CliGetToken, NeedsAWayToGetAToken) {
   const ProcessResult result = world.Run({});
   EXPECT_EQ(
       result.standardError,
-      "quorlin: say how to get a token: with --user, with --gss, or with --cert and --key (UsageException)\n");
+      "quorlin: say how to get a token: with --user, with --gss, or with --cert and --key or --pkcs12 (UsageException)\n");
   EXPECT_EQ(result.exitCode, 2);
 }
 
