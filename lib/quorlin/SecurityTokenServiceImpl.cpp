@@ -6,7 +6,6 @@
 #include <pelmar/Exception.h>
 #include <pelmar/MessageFormatter.h>
 #include <pelmar/SecretText.h>
-#include <pelmar/StringUtil.h>
 #include <pelmar/Verify.h>
 #include <pelmar/service/Logger.h>
 #include <quorlin/Exceptions.h>
@@ -33,7 +32,6 @@ using Pelmar::BooleanFormatter;
 using Pelmar::IntegerFormatter;
 using Pelmar::StringFormatter;
 using Pelmar::Service::LogInternal;
-using Pelmar::StringUtil::GenerateUuid;
 
 constexpr const char* kSource = "lib/quorlin/SecurityTokenServiceImpl";
 
@@ -132,80 +130,86 @@ SecurityTokenServiceImpl::SecurityTokenServiceImpl(
 boost::shared_ptr<const SamlToken> SecurityTokenServiceImpl::AcquireToken(const std::string& userName,
                                                                           const std::string& password,
                                                                           const TokenSpec& spec) const {
-  const OperationFrame frame(GenerateUuid(), "AcquireToken");
-  LogRequestFor(userName, spec);
+  return RunOperation("AcquireToken", [&] {
+    LogRequestFor(userName, spec);
 
-  Request request;
-  _requestBuilder->BuildUserPassTokenRequest(userName, password, spec, request);
-  LogInternal(getLogger(), kLogLevelInfo, "SecurityTokenServiceImpl::AcquireToken sending request");
-  const Answer answer = Send(*_transport, request);
-  LogInternal(getLogger(), kLogLevelInfo, "SecurityTokenServiceImpl::AcquireToken processing response");
-  std::string token;
-  _responseHandler->HandleAcquireTokenResponse(answer.response.Get(), token);
-  return ToSamlToken(token);
+    Request request;
+    _requestBuilder->BuildUserPassTokenRequest(userName, password, spec, request);
+    LogInternal(getLogger(), kLogLevelInfo, "SecurityTokenServiceImpl::AcquireToken sending request");
+    const Answer answer = Send(*_transport, request);
+    LogInternal(getLogger(), kLogLevelInfo, "SecurityTokenServiceImpl::AcquireToken processing response");
+    std::string token;
+    _responseHandler->HandleAcquireTokenResponse(answer.response.Get(), token);
+    return ToSamlToken(token);
+  });
 }
 
 boost::shared_ptr<const SamlToken> SecurityTokenServiceImpl::AcquireTokenByGSS(
     const TokenSpec& spec, NegotiationHandler& handler) const {
-  const OperationFrame frame(GenerateUuid(), "AcquireTokenByGSS");
-  LogRequestWith(spec);
+  return RunOperation("AcquireTokenByGSS", [&] {
+    LogRequestWith(spec);
 
-  const boost::shared_ptr<TransportSession> session = _transport->CreateSession();
-  SPNegoResponse response;
-  NegotiateLegs(*session, spec, handler, response);
-  CompleteNegotiation(handler, response.leg);
-  return ToSamlToken(response.token);
+    const boost::shared_ptr<TransportSession> session = _transport->CreateSession();
+    SPNegoResponse response;
+    NegotiateLegs(*session, spec, handler, response);
+    CompleteNegotiation(handler, response.leg);
+    return ToSamlToken(response.token);
+  });
 }
 
 boost::shared_ptr<const SamlToken> SecurityTokenServiceImpl::AcquireTokenByCertificate(
     const TokenSpec& spec) const {
-  const OperationFrame frame(GenerateUuid(), "AcquireTokenByCertificate");
-  LogRequestWith(spec);
+  return RunOperation("AcquireTokenByCertificate", [&] {
+    LogRequestWith(spec);
 
-  Request request;
-  _requestBuilder->BuildCertificateTokenRequest(spec, request);
-  const Answer answer = Send(*_transport, request);
-  std::string token;
-  _responseHandler->HandleAcquireTokenResponse(answer.response.Get(), token);
-  return ToSamlToken(token);
+    Request request;
+    _requestBuilder->BuildCertificateTokenRequest(spec, request);
+    const Answer answer = Send(*_transport, request);
+    std::string token;
+    _responseHandler->HandleAcquireTokenResponse(answer.response.Get(), token);
+    return ToSamlToken(token);
+  });
 }
 
 boost::shared_ptr<const SamlToken> SecurityTokenServiceImpl::AcquireTokenByToken(
     const SamlToken& token, const TokenSpec& spec) const {
-  const OperationFrame frame(GenerateUuid(), "AcquireTokenByToken");
-  LogExchange(token, spec);
+  return RunOperation("AcquireTokenByToken", [&] {
+    LogExchange(token, spec);
 
-  Request request;
-  _requestBuilder->BuildExchangeTokenRequest(token, spec, request);
-  const Answer answer = Send(*_transport, request);
-  std::string issued;
-  _responseHandler->HandleAcquireTokenResponse(answer.response.Get(), issued);
-  return ToSamlToken(issued);
+    Request request;
+    _requestBuilder->BuildExchangeTokenRequest(token, spec, request);
+    const Answer answer = Send(*_transport, request);
+    std::string issued;
+    _responseHandler->HandleAcquireTokenResponse(answer.response.Get(), issued);
+    return ToSamlToken(issued);
+  });
 }
 
 bool SecurityTokenServiceImpl::ValidateSubject(const SamlToken& token) const {
-  const OperationFrame frame(GenerateUuid(), "ValidateSubject");
-  LogToken("Validating subject of token %1", token);
+  return RunOperation("ValidateSubject", [&] {
+    LogToken("Validating subject of token %1", token);
 
-  Request request;
-  _requestBuilder->BuildValidateSubjectRequest(token, request);
-  const Answer answer = Send(*_transport, request);
-  const bool isValid = _responseHandler->HandleValidateSubjectResponse(answer.response.Get());
-  LogInternal(getLogger(), kLogLevelInfo, "Result: %1", BooleanFormatter(isValid));
-  return isValid;
+    Request request;
+    _requestBuilder->BuildValidateSubjectRequest(token, request);
+    const Answer answer = Send(*_transport, request);
+    const bool isValid = _responseHandler->HandleValidateSubjectResponse(answer.response.Get());
+    LogInternal(getLogger(), kLogLevelInfo, "Result: %1", BooleanFormatter(isValid));
+    return isValid;
+  });
 }
 
 boost::shared_ptr<const SamlToken> SecurityTokenServiceImpl::RenewToken(const SamlToken& token,
                                                                         long long lifetimeSec) const {
-  const OperationFrame frame(GenerateUuid(), "RenewToken");
-  LogRenewal(token, lifetimeSec);
+  return RunOperation("RenewToken", [&] {
+    LogRenewal(token, lifetimeSec);
 
-  Request request;
-  _requestBuilder->BuildRenewRequest(token, lifetimeSec, request);
-  const Answer answer = Send(*_transport, request);
-  std::string renewed;
-  _responseHandler->HandleRenewTokenResponse(answer.response.Get(), renewed);
-  return ToSamlToken(renewed);
+    Request request;
+    _requestBuilder->BuildRenewRequest(token, lifetimeSec, request);
+    const Answer answer = Send(*_transport, request);
+    std::string renewed;
+    _responseHandler->HandleRenewTokenResponse(answer.response.Get(), renewed);
+    return ToSamlToken(renewed);
+  });
 }
 
 // ---- Asynchronous operations: the blocking ones, called through the interface on a copy of this object ----

@@ -7,6 +7,7 @@
 #include "apps/ChildProcess.h"
 #include "support/HttpScripts.h"
 #include "support/LoopbackServer.h"
+#include "support/HttpCalls.h"
 #include "support/Pki.h"
 #include "support/Process.h"
 #include "support/TemporaryDirectory.h"
@@ -18,6 +19,7 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <fstream>
 #include <iterator>
 #include <regex>
@@ -431,6 +433,140 @@ TEST(Examples, LogSinkEscapesWhatCouldForgeALine) {
             "`a\\u000a\\\"b\\u001b', spec `TokenSpec [tokenLifetimeSec=600, delegable=false, "
             "delegateTo=<unset>, renewable=false, confirmationType=0,audienceRestriction=, advice=[]'\"}");
   EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, LogFieldsWritesOneLinePerOperation) {
+  const World world;
+  const ProcessResult result = world.RunClient("logFields", {"alice@example.com"}, "secret\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(Mask(Mask(Mask(result.standardOutput, kDatePattern, "DATE"), kUuidPattern, "UUID"),
+                 "duration_us=[0-9]+", "duration_us=N"),
+            "time=DATE operation=AcquireToken operation_id=UUID attempt=1 duration_us=N outcome=success\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, LogFieldsTellsHowAnOperationFailed) {
+  const World world;
+  const ProcessResult result = world.RunClient("logFields", {"alice@example.com"}, "wrong\n");
+  EXPECT_EQ(result.standardError, "Authentication failed: Invalid user name or password\n");
+  EXPECT_EQ(Mask(Mask(Mask(result.standardOutput, kDatePattern, "DATE"), kUuidPattern, "UUID"),
+                 "duration_us=[0-9]+", "duration_us=N"),
+            "time=DATE operation=AcquireToken operation_id=UUID attempt=1 duration_us=N "
+            "outcome=invalid_credentials\n");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, AcquireFuturesGetsTheTokensOfAllUsers) {
+  const World world;
+  const ProcessResult result =
+      world.RunClient("acquireFutures", {}, "alice@example.com secret\nbob@example.com builder\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(result.standardOutput,
+            "{Name: alice; Domain:example.com} is known\n"
+            "{Name: bob; Domain:example.com} is known\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, AcquireFuturesTellsAWrongPasswordFromAMissingService) {
+  World world;
+  const std::string users = "alice@example.com wrong\nbob@example.com builder\n";
+  const ProcessResult wrong = world.RunClient("acquireFutures", {}, users);
+  EXPECT_EQ(wrong.standardError, "");
+  EXPECT_EQ(wrong.standardOutput,
+            "wrong password: Authentication failed: Invalid user name or password\n"
+            "{Name: bob; Domain:example.com} is known\n");
+  EXPECT_EQ(wrong.exitCode, 1);
+
+  world.GetService().Stop();
+  const ProcessResult away = world.RunClient("acquireFutures", {}, users);
+  EXPECT_EQ(Mask(away.standardOutput, "127[.]0[.]0[.]1:[0-9]+", "SERVICE"),
+            "no answer: Connection refused by SERVICE\nno answer: Connection refused by SERVICE\n");
+  EXPECT_EQ(away.exitCode, 1);
+}
+
+#ifdef QUORLIN_HAS_COROUTINES
+TEST(Examples, AwaitTokenGetsATokenAndTheWordOnItsSubject) {
+  const World world;
+  const ProcessResult result = world.RunClient("awaitToken", {"alice@example.com"}, "secret\n");
+  EXPECT_EQ(result.standardError, "");
+  EXPECT_EQ(result.standardOutput, "{Name: alice; Domain:example.com} is known\n");
+  EXPECT_EQ(result.exitCode, 0);
+}
+
+TEST(Examples, AwaitTokenSaysWhyThereIsNoToken) {
+  const World world;
+  const ProcessResult result = world.RunClient("awaitToken", {"alice@example.com"}, "wrong\n");
+  EXPECT_EQ(result.standardError, "Authentication failed: Invalid user name or password\n");
+  EXPECT_EQ(result.standardOutput, "");
+  EXPECT_EQ(result.exitCode, 1);
+}
+
+TEST(Examples, AwaitTokenStopsWhenItIsTold) {
+  DevSts::ServiceConfig config;
+  config.delay = std::chrono::hours(24);
+  const World world(config);
+  const ProcessResult result = world.RunClient("awaitToken", {"alice@example.com"}, "secret\nstop\n");
+  EXPECT_EQ(result.standardError, "The operation was cancelled.\n");
+  EXPECT_EQ(result.standardOutput, "");
+  EXPECT_EQ(result.exitCode, 1);
+}
+#endif
+
+std::string FindMetricsPort(const std::string& output) {
+  std::smatch match;
+  EXPECT_TRUE(std::regex_search(output, match, std::regex("http://127[.]0[.]0[.]1:([0-9]+)/metrics")));
+  return match[1];
+}
+
+TEST(Examples, MetricsEndpointShowsWhatWasCounted) {
+  const World world;
+  StsTests::ChildProcess child(
+      {GetExamplePath("metricsEndpoint"), world.GetUrl(), world.GetPath("ca.pem"), world.GetPath("sts.pem")},
+      StsTests::ChildProcess::Terminal::OWN);
+  const Pelmar::Ref<Pelmar::Http::UserAgent> scraper =
+      TestSupport::MakeAgent(std::stoi(FindMetricsPort(child.ReadUntil("/metrics\r\n"))));
+  EXPECT_EQ(TestSupport::Call(*scraper, TestSupport::MakeGet("/metrics")),
+            "200 OK|"
+            "# HELP quorlin_operation_duration_seconds Time that token service operations took.\n"
+            "# TYPE quorlin_operation_duration_seconds summary\n"
+            "# HELP quorlin_operation_retries_total Requests that were tried again.\n"
+            "# TYPE quorlin_operation_retries_total counter\n");
+
+  child.Type("alice@example.com secret\n");
+  child.ReadUntil("{Name: alice; Domain:example.com}\r\n");
+  child.Type("alice@example.com wrong\n");
+  child.ReadUntil("no token: Authentication failed: Invalid user name or password\r\n");
+  child.Type("bob@example.com builder\n");
+  child.ReadUntil("{Name: bob; Domain:example.com}\r\n");
+  const std::string failed = "{operation=\"AcquireToken\",outcome=\"invalid_credentials\"} ";
+  const std::string succeeded = "{operation=\"AcquireToken\",outcome=\"success\"} ";
+  EXPECT_EQ(Mask(TestSupport::Call(*scraper, TestSupport::MakeGet("/metrics")), "[0-9]+[.][0-9]{6}\n", "S\n"),
+            "200 OK|"
+            "# HELP quorlin_operation_duration_seconds Time that token service operations took.\n"
+            "# TYPE quorlin_operation_duration_seconds summary\n"
+            "quorlin_operation_duration_seconds_sum" +
+                failed +
+                "S\n"
+                "quorlin_operation_duration_seconds_count" +
+                failed +
+                "1\n"
+                "quorlin_operation_duration_seconds_sum" +
+                succeeded +
+                "S\n"
+                "quorlin_operation_duration_seconds_count" +
+                succeeded +
+                "2\n"
+                "# HELP quorlin_operation_retries_total Requests that were tried again.\n"
+                "# TYPE quorlin_operation_retries_total counter\n"
+                "quorlin_operation_retries_total" +
+                failed +
+                "0\n"
+                "quorlin_operation_retries_total" +
+                succeeded + "0\n");
+  EXPECT_EQ(TestSupport::Call(*scraper, TestSupport::MakeGet("/")), "404 Not Found|");
+
+  child.Type("\x04");
+  EXPECT_EQ(child.Wait(), 0);
 }
 
 TEST(Examples, TestAgainstDevStsPasses) {

@@ -35,8 +35,8 @@ struct SPNegoResponse {
 /// The client's side of a GSS/SPNEGO negotiation, supplied by the caller.
 class QUORLIN_API NegotiationHandler {
  public:
-  /// Answers the service's message with the client's next one. The first call gets an empty message. While the
-  /// negotiation goes on null is an error and an empty message ends the process; after the service's last
+  /// Answers the service's message with the client's next one. The first call gets an empty message. While
+  /// the negotiation goes on null is an error and an empty message ends the process; after the service's last
   /// message both say that nothing is left to send. Called on the operation's thread, round after round.
   virtual boost::shared_ptr<Leg> Negotiate(const Leg& serverLeg) = 0;
 
