@@ -8,10 +8,12 @@ include(CheckPIESupported)
 check_pie_supported(LANGUAGES CXX)
 
 # Control-flow protection is the processor's affair: x86 has it as CET, AArch64 as BTI and PAC. Where the compiler knows
-# neither, there is none.
+# neither, there is none. clang only warns of a flag that its target has no use for, and is to be taken at its word.
+set(CMAKE_REQUIRED_FLAGS -Werror)
 check_cxx_compiler_flag(-fcf-protection=full QUORLIN_HAS_CF_PROTECTION)
 check_cxx_compiler_flag(-mbranch-protection=standard QUORLIN_HAS_BRANCH_PROTECTION)
 check_cxx_compiler_flag(-fstack-clash-protection QUORLIN_HAS_STACK_CLASH_PROTECTION)
+unset(CMAKE_REQUIRED_FLAGS)
 
 # Warnings are our business alone: linked PRIVATE for the build, never exported.
 add_library(quorlin_warnings INTERFACE)
