@@ -140,6 +140,12 @@ TEST(Certificate, RefusesWhatIsTooLarge) {
             "The certificate is larger than 65536 bytes");
 }
 
+TEST(Certificate, RefusesAPemTextThatIsTooLarge) {
+  const std::string text(16 * 1024 * 1024 + 1, ' ');
+  EXPECT_EQ(RefusalOfPem(text), "The PEM text is larger than 16777216 bytes");
+  EXPECT_EQ(RefusalOfPem(text.substr(1)), "The PEM text holds no certificate");
+}
+
 TEST(Certificate, RefusesAMalformedValidityPeriod) {
   std::vector<unsigned char> der = MakeNamed("Malformed")->GetDer();
   const std::string bytes(der.begin(), der.end());

@@ -2,6 +2,8 @@
 // Copyright the Quorlin authors
 
 #include <pelmar/Exception.h>
+#include <pelmar/crypto/CryptoException.h>
+#include <pelmar/http/HttpException.h>
 #include <pelmar/system/DateTime.h>
 
 #include "pelmar/core/Backtrace.h"
@@ -40,6 +42,9 @@ const std::vector<ClassCase>& GetClassCases() {
       MakeClassCase<TypeMismatchException>("Pelmar::TypeMismatchException", ""),
       MakeClassCase<Base64FormatException>("Pelmar::Base64FormatException", ""),
       MakeClassCase<System::DateFormatException>("Pelmar::System::DateFormatException", ""),
+      MakeClassCase<Crypto::CryptoException>("Pelmar::Crypto::CryptoException", ""),
+      MakeClassCase<Http::HttpException>("Pelmar::Http::HttpException", ""),
+      MakeClassCase<Http::HttpTimeoutException>("Pelmar::Http::HttpTimeoutException", ""),
   };
   return cases;
 }

@@ -208,6 +208,10 @@ TEST(HttpClient, RefusesMissingParts) {
             CatchArgumentRefusal([] { CreateHttpUserAgent(nullptr, CreateCookieStore(""), nullptr); }));
   EXPECT_EQ("Invalid argument : the cookie store is null or was not made by this platform",
             CatchArgumentRefusal([&] { CreateHttpUserAgent(spec, nullptr, nullptr); }));
+  class Pool final : public ConnectionPool {};
+  EXPECT_EQ("Invalid argument : there are no connection pools, so the pool must be null",
+            CatchArgumentRefusal(
+                [&] { CreateHttpUserAgent(spec, CreateCookieStore(""), Pelmar::MakeRef<Pool>()); }));
   const Ref<UserAgent> agent = MakeAgent(spec);
   Ref<PendingRequestItem> item;
   Ref<ClientResponse> response;

@@ -20,6 +20,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace {
 
@@ -282,6 +283,22 @@ TEST(SSLContext, RefusesAKeyOfAnotherCertificate) {
   options.clientKey = Ca().GetKey();
   options.clientCertificate = MakeServer(Ca()).certificate;
   EXPECT_EQ(RefusalOf(options), "CryptoException: The client key does not belong to the client certificate");
+}
+
+TEST(SSLContext, RefusesAKeyOfAnotherImplementation) {
+  class Foreign final : public Pelmar::Crypto::PrivateKey {
+   public:
+    Pelmar::Crypto::KeyType GetType() const override { return Pelmar::Crypto::KEY_RSA; }
+    std::vector<unsigned char> Sign(Pelmar::Crypto::DigestAlgorithm, const void*,
+                                    std::size_t) const override {
+      return {};
+    }
+  };
+  SSLContextOptions options;
+  options.clientKey = Pelmar::MakeRef<Foreign>();
+  options.clientCertificate = MakeServer(Ca()).certificate;
+  EXPECT_EQ(RefusalOf(options),
+            "InvalidArgumentException: Invalid argument : the client key was not made by this platform");
 }
 
 TEST(SSLContext, RefusesAnchorsThatCannotBeRead) {

@@ -325,6 +325,41 @@ TEST(Signature, IsJudgedBySignerFirstAndContentLast) {
   EXPECT_EQ(VerifyDocument(text, Trust({stranger})), "refused");
 }
 
+TEST(Signature, RefusesAResolverThatFindsNobody) {
+  class Silent final : public KeyInfoResolver {
+   public:
+    Ref<const Pelmar::Crypto::Certificate> ResolveSigner(const ElementNode* /*keyInfo*/) const override {
+      return nullptr;
+    }
+  };
+  const Ref<Document> document = ParseDocument(SignedDocument());
+  ElementNode* const root = document->GetDocumentElement();
+  Ref<Signature> signature;
+  CreateSignatureFromDom(root, FindSignature(*root), signature);
+  const Ref<Silent> resolver = Pelmar::MakeRef<Silent>();
+  try {
+    signature->Verify(resolver.Get());
+    FAIL() << "verified";
+  } catch (const XmlSecurityException& error) {
+    EXPECT_STREQ("There is no certificate", error.what());
+  }
+}
+
+TEST(Signature, ThatStandsInNoTextIsRefusedWithoutAPlace) {
+  const Ref<Document> document = ParseDocument(kPlain);
+  Ref<ElementNode> element;
+  CreateElementNode("ds", "Signature", element);
+  element->DefineAttribute("xmlns:ds", kSignatureNamespace);
+  document->GetDocumentElement()->AppendChild(element);
+  Ref<Signature> signature;
+  try {
+    CreateSignatureFromDom(document->GetDocumentElement(), element.Get(), signature);
+    FAIL() << "read";
+  } catch (const SignatureSyntaxException& error) {
+    EXPECT_STREQ("Element 'SignedInfo' is missing in 'ds:Signature'", error.what());
+  }
+}
+
 TEST(Signature, OfAnotherKeyUnderATrustedCertificateIsRefused) {
   CertificateSpec spec;
   spec.keyNumber = 7;

@@ -142,6 +142,24 @@ TEST(TransferFailure, TellsTheServersAlert) {
   EXPECT_EQ("sts.test:443 ended TLS: handshake failure", Tell(facts));
 }
 
+TEST(TransferFailure, TellsTheAlertOfOurOwnSide) {
+  TransferFacts facts = MakeFacts(CURLE_SSL_CONNECT_ERROR);
+  const auto tls = std::make_shared<TlsRecord>();
+  tls->alert = TlsAlert::OTHER;
+  tls->alertText = "decode error";
+  facts.tls = tls;
+  EXPECT_EQ("TLS with sts.test:443 failed: decode error", Tell(facts));
+  tls->alert = TlsAlert::PROTOCOL_VERSION;
+  EXPECT_EQ("sts.test:443 does not speak TLS 1.2 or newer", Tell(facts));
+}
+
+TEST(TransferFailure, TellsAnEndWithoutGoodbye) {
+  // SSL_R_UNEXPECTED_EOF_WHILE_READING.
+  EXPECT_EQ(
+      "sts.test:443 closed the connection before it answered",
+      Tell(MakeFacts(CURLE_SSL_CONNECT_ERROR, "error:0A000126:SSL routines::unexpected eof while reading")));
+}
+
 TEST(TransferFailure, MasksControlCharactersOfTheEngine) {
   EXPECT_EQ("Exchange with sts.test:443 failed: a?b", Tell(MakeFacts(CURLE_BAD_FUNCTION_ARGUMENT, "a\nb")));
   EXPECT_EQ("Exchange with sts.test:443 failed: Out of memory", Tell([] {
