@@ -117,6 +117,19 @@ TEST(Signature, IsTheSameWhereverItIsPutAfterwards) {
   EXPECT_TRUE(read->Verify(resolver.Get()));
 }
 
+TEST(Signature, OverAnElementOfNoDocumentCoversTheElement) {
+  Ref<ElementNode> element;
+  CreateElementNode("", "detached", element);
+  const Ref<Signature> signature = MakeBlank(element.Get());
+  signature->AddReference("", kSha256)->AddTransform(kEnvelopedSignature);
+  signature->SetKeyInfo(MakeX509Data({Signer()}));
+  signature->Sign(Signer().GetKey().Get());
+  element->AppendChild(signature->GetElement());
+  EXPECT_EQ(VerifyElement(element.Get(), Trust({Signer()})), "verified");
+  element->DefineAttribute("changed", "");
+  EXPECT_EQ(VerifyElement(element.Get(), Trust({Signer()})), "refused");
+}
+
 TEST(Signature, WithoutKeyInfoIsMadeWithoutTheElement) {
   const Ref<Document> document = ParseDocument(kPlain);
   const Ref<Signature> signature = MakeBlank(document->GetDocumentElement());

@@ -270,6 +270,9 @@ TEST(Signature, TakesOnlyIdsThatCount) {
   const std::string expected =
       "XmlSecurityException: Reference '#plain' refers to no element that could be signed";
   EXPECT_EQ(RefusalOf([] { SignMessage({"#plain"}, {}); }), expected);
+  // Beside another ID that counts, either.
+  EXPECT_EQ(RefusalOf([] { SignDocument("<a ID=\"_2\" Id=\"_1\"/>", Signer()); }),
+            "XmlSecurityException: Reference '#_1' refers to no element that could be signed");
 }
 
 TEST(Signature, DoesNotFindElementsOutsideItsContext) {
@@ -323,6 +326,9 @@ TEST(Signature, IsJudgedBySignerFirstAndContentLast) {
       VerdictOf(text),
       "XmlSecurityException: Certificate chain is not trusted: self-signed certificate (CN=Test signer)");
   EXPECT_EQ(VerifyDocument(text, Trust({stranger})), "refused");
+  // Algorithms come before the signer.
+  EXPECT_EQ(VerdictOf(Replace(text, kRsaSha256, "urn:method")),
+            "XmlSecurityException: Signature method 'urn:method' is not accepted");
 }
 
 TEST(Signature, RefusesAResolverThatFindsNobody) {

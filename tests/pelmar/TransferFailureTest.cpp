@@ -155,9 +155,11 @@ TEST(TransferFailure, TellsTheAlertOfOurOwnSide) {
 
 TEST(TransferFailure, TellsAnEndWithoutGoodbye) {
   // SSL_R_UNEXPECTED_EOF_WHILE_READING.
-  EXPECT_EQ(
-      "sts.test:443 closed the connection before it answered",
-      Tell(MakeFacts(CURLE_SSL_CONNECT_ERROR, "error:0A000126:SSL routines::unexpected eof while reading")));
+  const std::string engineText = "error:0A000126:SSL routines::unexpected eof while reading";
+  EXPECT_EQ("sts.test:443 closed the connection during the TLS handshake",
+            Tell(MakeFacts(CURLE_SSL_CONNECT_ERROR, engineText)));
+  EXPECT_EQ("sts.test:443 closed the connection before it answered",
+            Tell(MakeFacts(CURLE_RECV_ERROR, engineText)));
 }
 
 TEST(TransferFailure, MasksControlCharactersOfTheEngine) {

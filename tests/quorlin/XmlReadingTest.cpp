@@ -491,7 +491,7 @@ TEST(GetULongOptionalAttribute, ReadsNumbersUpToTheLargestSigned64BitOne) {
 
 TEST(GetULongOptionalAttribute, RefusesAllElse) {
   for (const char* const text :
-       {"-1", "1.5", " 1", "1 ", "9223372036854775808", "-9223372036854775809", "", "+", "-", "+-1", "-+1",
+       {"-1", "1.5", " 1", "1 ", "9223372036854775808", "-9223372036854775809", "", "+", "-", "+-1", "+-0", "-+1",
         "++1", "0x1", "1e3", "1,000", "one", "99999999999999999999999"}) {
     EXPECT_EQ(NumberOf(std::string("Count='") + text + "'"),
               Refused("e/@Count is not a non-negative integer."))
