@@ -446,8 +446,8 @@ TEST(Cli, WantsACommand) {
     EXPECT_EQ(result.exitCode, 2);
     EXPECT_EQ(
         result.standardError,
-        "quorlin: there has to be one of these commands: acquire, renew, validate, verify, inspect, doctor, request, "
-        "sts, demo\nTry quorlin --help\n");
+        "quorlin: there has to be one of these commands: acquire, renew, get-token, validate, verify, inspect, doctor, "
+        "request, sts, demo\nTry quorlin --help\n");
   }
 }
 

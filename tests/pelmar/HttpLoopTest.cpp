@@ -89,7 +89,7 @@ TEST(HttpLoop, EndsWhatIsPendingWhenShutDown) {
       exchange->GetResult();
       FAIL() << "a result";
     } catch (const Pelmar::Exception& e) {
-      EXPECT_EQ("HttpException: Request was cancelled: the process ends", Describe(e));
+      EXPECT_EQ("HttpException: Request was cancelled: the process ends", DescribeFailure(e));
     }
   }
   server.AwaitEnd(0);

@@ -56,7 +56,7 @@ std::string Describe(ClientResponse& response) {
   return std::to_string(response.GetStatusCode()) + " " + response.GetReason() + "|" + ReadAll(response);
 }
 
-std::string Describe(const Pelmar::Exception& error) {
+std::string DescribeFailure(const Pelmar::Exception& error) {
   return GetClassName(error) + ": " + error.what();
 }
 
@@ -72,7 +72,7 @@ std::string Await(UserAgent& agent, const Ref<PendingRequestItem>& item, long lo
     agent.WaitFor(item, timeoutMicroseconds, response);
     return Describe(*response);
   } catch (const Pelmar::Exception& error) {
-    return Describe(error);
+    return DescribeFailure(error);
   }
 }
 
@@ -81,7 +81,7 @@ CompletionFunctor Completions::GetFunctor() {
     if ((error == nullptr) == (response == nullptr) || item == nullptr || !item->Wait(0)) {
       Add("a completion that breaks its contract");
     } else {
-      Add(error == nullptr ? Describe(*response) : Describe(*error));
+      Add(error == nullptr ? Describe(*response) : DescribeFailure(*error));
     }
   };
 }

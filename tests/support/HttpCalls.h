@@ -33,7 +33,7 @@ std::string ReadAll(Pelmar::Reader& reader);
 /// "200 OK|body".
 std::string Describe(Pelmar::Http::ClientResponse& response);
 /// "HttpException: message", with the name of the dynamic class.
-std::string Describe(const Pelmar::Exception& error);
+std::string DescribeFailure(const Pelmar::Exception& error);
 
 /// Sends and waits; the outcome in the words above.
 std::string Call(Pelmar::Http::UserAgent& agent, const Pelmar::Ref<Pelmar::Http::ClientRequest>& request,
