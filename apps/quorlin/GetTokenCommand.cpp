@@ -25,6 +25,7 @@
 #include <cstring>
 #include <filesystem>
 #include <iostream>
+#include <list>
 #include <memory>
 #include <optional>
 
@@ -33,6 +34,7 @@ namespace Cli {
 namespace {
 
 using TokenPointer = boost::shared_ptr<const Quorlin::SamlToken>;
+using TrustList = std::list<Pelmar::Ref<const Pelmar::Crypto::Certificate>>;
 
 constexpr long long kMicrosecondsPerSecond = 1000000;
 /// Where a program that is run finds the token.
@@ -69,22 +71,27 @@ void CheckArguments(const GetTokenArguments& arguments) {
   }
 }
 
-/// The digest of all that a token depends on. JSON keeps the parts apart; no secret is among them.
-std::string DigestPurpose(const GetTokenArguments& arguments,
-                          const Quorlin::SecurityTokenServiceConfig& config) {
-  const Acquisition& asked = arguments.acquisition;
-  const std::string certificate =
-      config.holderOfKeyConfig ? Pelmar::Crypto::ToHex(config.holderOfKeyConfig->certificate->GetSha256())
-                               : std::string();
-  const std::string advice = asked.token.adviceFile.empty() ? "" : ReadFile(asked.token.adviceFile);
-  const auto parts = nlohmann::json::array(
-      {asked.service.url, asked.userName, arguments.byGss, asked.kerberos.target, asked.kerberos.principal,
-       asked.kerberos.cache, certificate, asked.token.lifetimeSec, asked.token.renewable,
-       asked.token.delegable, asked.token.delegateTo, asked.token.audience, advice, asked.token.bearer});
-  // Bytes that are no UTF-8 are kept apart by nothing else, and refused by the request anyway.
-  const std::string text = parts.dump(-1, ' ', true, nlohmann::json::error_handler_t::replace);
+std::string Digest(const std::string& text) {
   return Pelmar::Crypto::ToHex(
       Pelmar::Crypto::ComputeDigest(Pelmar::Crypto::DIGEST_SHA256, text.data(), text.size()));
+}
+
+std::string DigestFile(const std::string& path) {
+  return path.empty() ? "" : Digest(ReadFile(path));
+}
+
+/// The digest of all that a token depends on. JSON keeps the parts apart. No secret is among them, and none
+/// is asked for: a token that is kept needs no key.
+std::string DigestPurpose(const GetTokenArguments& arguments) {
+  const Acquisition& asked = arguments.acquisition;
+  const auto parts = nlohmann::json::array(
+      {asked.service.url, asked.userName, arguments.byGss, asked.kerberos.target, asked.kerberos.principal,
+       asked.kerberos.cache, DigestFile(asked.holderOfKey.certificateFile),
+       DigestFile(asked.holderOfKey.pkcs12File), asked.token.lifetimeSec, asked.token.renewable,
+       asked.token.delegable, asked.token.delegateTo, asked.token.audience,
+       DigestFile(asked.token.adviceFile), asked.token.bearer});
+  // Bytes that are no UTF-8 are kept apart by nothing else, and refused by the request anyway.
+  return Digest(parts.dump(-1, ' ', true, nlohmann::json::error_handler_t::replace));
 }
 
 long long GetLeftMicroseconds(const Quorlin::SamlToken& token) {
@@ -100,9 +107,9 @@ void Warn(const std::string& text) {
 }
 
 /// What is wrong with the token, its time aside; empty when nothing is.
-std::string FindFault(const std::string& xml, const Quorlin::SecurityTokenServiceConfig& config) {
+std::string FindFault(const std::string& xml, const TrustList& trusted) {
   try {
-    Quorlin::CreateSamlToken(xml, config.trustedStsCertificates, kAnyTimeSec);
+    Quorlin::CreateSamlToken(xml, trusted, kAnyTimeSec);
     return "";
   } catch (...) {
     return DescribeCurrentException(EXIT_REFUSED).message;
@@ -111,18 +118,18 @@ std::string FindFault(const std::string& xml, const Quorlin::SecurityTokenServic
 
 /// The token of the cache if it is one that this run would ask for, and valid; null otherwise. `fault`
 /// becomes what is wrong with it, its time aside.
-TokenPointer FindToken(const TokenCacheFile& cache, const std::string& purpose,
-                       const Quorlin::SecurityTokenServiceConfig& config, std::string& fault) {
+TokenPointer FindToken(const TokenCacheFile& cache, const std::string& purpose, const TrustList& trusted,
+                       std::string& fault) {
   const std::optional<CachedToken> cached = cache.Read();
   if (!cached || cached->purpose != purpose) {
     return nullptr;
   }
-  fault = FindFault(cached->xml, config);
+  fault = FindFault(cached->xml, trusted);
   if (!fault.empty()) {
     return nullptr;
   }
   try {
-    return Quorlin::CreateSamlToken(cached->xml, config.trustedStsCertificates);
+    return Quorlin::CreateSamlToken(cached->xml, trusted);
   } catch (const Quorlin::ParseException&) {
     return nullptr;  // Its time is over.
   }
@@ -136,17 +143,16 @@ TokenPointer Acquire(const GetTokenArguments& arguments) {
 }
 
 /// Null when the token is none that can be renewed, or the service will not.
-TokenPointer TryToRenew(const TokenPointer& old, const GetTokenArguments& arguments,
-                        const Quorlin::SecurityTokenServiceConfig& config) {
+TokenPointer TryToRenew(const TokenPointer& old, const Acquisition& acquisition) {
   if (!old || !old->IsRenewable() ||
       old->GetConfirmationMethod() != Quorlin::SamlToken::CONFIRM_HOLDER_OF_KEY) {
     return nullptr;
   }
+  const ServiceCall call(MakeServiceConfig(acquisition.service, acquisition.holderOfKey), acquisition.call);
   try {
-    return ServiceCall(config, arguments.acquisition.call)
-        .Run([&](const Quorlin::SecurityTokenService& service) {
-          return service.RenewToken(*old, arguments.acquisition.token.lifetimeSec);
-        });
+    return call.Run([&](const Quorlin::SecurityTokenService& service) {
+      return service.RenewToken(*old, acquisition.token.lifetimeSec);
+    });
   } catch (const Quorlin::CommunicationException&) {
     throw;
   } catch (const Quorlin::SsoException&) {
@@ -154,9 +160,8 @@ TokenPointer TryToRenew(const TokenPointer& old, const GetTokenArguments& argume
   }
 }
 
-TokenPointer GetNewToken(const TokenPointer& old, const GetTokenArguments& arguments,
-                         const Quorlin::SecurityTokenServiceConfig& config) {
-  TokenPointer token = TryToRenew(old, arguments, config);
+TokenPointer GetNewToken(const TokenPointer& old, const GetTokenArguments& arguments) {
+  TokenPointer token = TryToRenew(old, arguments.acquisition);
   if (!token || !HoldsLongEnough(*token, arguments)) {
     token = Acquire(arguments);
   }
@@ -172,10 +177,9 @@ TokenPointer GetNewToken(const TokenPointer& old, const GetTokenArguments& argum
 
 /// A token whose cache says the same. One that is valid for a short while only is better than none.
 TokenPointer ReplaceToken(const TokenPointer& old, const std::string& purpose,
-                          const GetTokenArguments& arguments,
-                          const Quorlin::SecurityTokenServiceConfig& config, const TokenCacheFile& cache) {
+                          const GetTokenArguments& arguments, const TokenCacheFile& cache) {
   try {
-    const TokenPointer token = GetNewToken(old, arguments, config);
+    const TokenPointer token = GetNewToken(old, arguments);
     cache.Replace({token->ToXml(), purpose});
     return token;
   } catch (...) {
@@ -191,26 +195,25 @@ TokenPointer ReplaceToken(const TokenPointer& old, const std::string& purpose,
 }
 
 TokenPointer GetToken(const GetTokenArguments& arguments) {
-  const Quorlin::SecurityTokenServiceConfig config =
-      MakeServiceConfig(arguments.acquisition.service, arguments.acquisition.holderOfKey);
-  const std::string purpose = DigestPurpose(arguments, config);
+  const TrustList trusted = ReadCertificates(arguments.acquisition.service.stsCertificateFiles);
+  const std::string purpose = DigestPurpose(arguments);
   TokenCacheFile cache(arguments.cacheFile);
   std::string fault;
-  TokenPointer token = FindToken(cache, purpose, config, fault);
+  TokenPointer token = FindToken(cache, purpose, trusted, fault);
   if (token && HoldsLongEnough(*token, arguments)) {
     return token;
   }
   // Whoever held the lock before us may have got just what we need.
   cache.Lock();
   fault.clear();
-  token = FindToken(cache, purpose, config, fault);
+  token = FindToken(cache, purpose, trusted, fault);
   if (token && HoldsLongEnough(*token, arguments)) {
     return token;
   }
   if (!fault.empty()) {
     Warn("the token in " + arguments.cacheFile + " is not used: " + fault);
   }
-  return ReplaceToken(token, purpose, arguments, config, cache);
+  return ReplaceToken(token, purpose, arguments, cache);
 }
 
 /// Becomes the program. Returns only by exception.

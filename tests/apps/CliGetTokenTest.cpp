@@ -152,6 +152,17 @@ TEST(CliGetToken, AsksNobodyWhileTheTokenIsGood) {
   EXPECT_EQ(world.CountRequests(), 1);
 }
 
+TEST(CliGetToken, NeedsNoKeyWhileTheTokenIsGood) {
+  const World world;
+  const ProcessResult first = world.RunByKey();
+  ASSERT_EQ(first.exitCode, 0) << first.standardError;
+  std::filesystem::remove(world.GetPath("key.pem"));
+  const ProcessResult second = world.RunByKey();
+  EXPECT_EQ(second.standardOutput, first.standardOutput);
+  EXPECT_EQ(second.standardError, "");
+  EXPECT_EQ(second.exitCode, 0);
+}
+
 TEST(CliGetToken, GetsAnotherTokenForWhomeverElseOrWhateverElseItIs) {
   const World world;
   std::vector<std::string> tokens = {world.RunByPassword().standardOutput};

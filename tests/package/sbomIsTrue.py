@@ -13,8 +13,8 @@ import sys
 
 # The components behind the libraries; none for our own and for those of the compiler and the C library.
 COMPONENTS = {"libexpat": "expat", "libssl": "openssl", "libcrypto": "openssl", "libcurl": "libcurl", "libgssapi_krb5": "krb5-gssapi"}
-TOOLCHAIN = {"libpelmar", "libquorlin", "libquorlin-gssapi", "libstdc++", "libgcc_s", "libc", "libm", "libpthread", "ld-linux-x86-64",
-             "ld-linux-aarch64"}
+TOOLCHAIN = {"libpelmar", "libquorlin", "libquorlin-gssapi", "libquorlin-provider", "libstdc++", "libgcc_s", "libc", "libm", "libpthread",
+             "ld-linux-x86-64", "ld-linux-aarch64"}
 COMPONENT_KEYS = {"type", "bom-ref", "name", "version", "scope", "description", "purl", "licenses"}
 
 
