@@ -26,6 +26,7 @@
 
 #ifdef QUORLIN_FUZZ_XMLSEC
 #include <libxml/parser.h>
+#include <libxml/uri.h>
 #include <libxml/xmlerror.h>
 #include <xmlsec/crypto.h>
 #include <xmlsec/errors.h>
@@ -232,11 +233,14 @@ bool IsPlainId(const std::string& value) {
 }
 
 /// libxml2 2.9 writes some namespace URIs otherwise than Canonical XML 1.0 has it: it leaves white space and
-/// "<" in them as they are, takes "&amp;" for "&#38;", and canonicalises no document with a relative URI in
-/// it.
-bool IsPlainUri(const std::string& uri) {
-  return uri.find_first_not_of(kUriCharacters) == std::string::npos &&
-         (uri.empty() || uri.find(':') != std::string::npos);
+/// "<" in them as they are, takes "&amp;" for "&#38;", and canonicalises no document with a URI that is
+/// relative, or that its own parser does not read.
+bool IsPlainUri(const std::string& text) {
+  if (text.empty() || text.find_first_not_of(kUriCharacters) != std::string::npos) {
+    return text.empty();
+  }
+  const std::unique_ptr<xmlURI, decltype(&xmlFreeURI)> uri(xmlParseURI(text.c_str()), xmlFreeURI);
+  return uri != nullptr && uri->scheme != nullptr;
 }
 
 bool HasPlainTexts(const Node* node) {

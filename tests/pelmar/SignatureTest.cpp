@@ -348,6 +348,20 @@ TEST(Signature, RefusesEveryOtherStructure) {
        "xml-exc-c14n#\"><ec:InclusiveNamespaces xmlns:ec=\"http://www.w3.org/2001/10/xml-exc-c14n#\"/>"
        "</ds:Transform></ds:Transforms>",
        "Attribute 'PrefixList' is missing in 'ec:InclusiveNamespaces'", "<ec:InclusiveNamespaces"},
+      {"xml-exc-c14n#\"/></ds:Transforms>",
+       "xml-exc-c14n#\"><ec:InclusiveNamespaces xmlns:ec=\"http://www.w3.org/2001/10/xml-exc-c14n#\" PrefixList="
+       "\"a\" x=\"\"/></ds:Transform></ds:Transforms>",
+       "Unexpected attribute 'x' in 'ec:InclusiveNamespaces'", "<ec:InclusiveNamespaces"},
+      {"xml-exc-c14n#\"/></ds:Transforms>",
+       "xml-exc-c14n#\"><ec:InclusiveNamespaces xmlns:ec=\"http://www.w3.org/2001/10/xml-exc-c14n#\" PrefixList="
+       "\"a\"><x/></ec:InclusiveNamespaces></ds:Transform></ds:Transforms>",
+       "Unexpected element 'x' in 'ec:InclusiveNamespaces'", "<x/>"},
+      {"<ds:Transforms>", "<ds:Transforms x=\"\">", "Unexpected attribute 'x' in 'ds:Transforms'",
+       "<ds:Transforms "},
+      {"<ds:DigestMethod ", "<ds:DigestMethod x=\"\" ", "Unexpected attribute 'x' in 'ds:DigestMethod'",
+       "<ds:DigestMethod "},
+      {"<ds:SignatureValue>", "<ds:SignatureValue x=\"\">", "Unexpected attribute 'x' in 'ds:SignatureValue'",
+       "<ds:SignatureValue "},
       {"enveloped-signature\"/>",
        "enveloped-signature\"/><ds:Transform Algorithm=\"http://www.w3.org/TR/2001/REC-xml-c14n-20010315"
        "\"><ec:InclusiveNamespaces xmlns:ec=\"http://www.w3.org/2001/10/xml-exc-c14n#\" PrefixList="

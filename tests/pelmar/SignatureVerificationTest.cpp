@@ -157,6 +157,8 @@ TEST(Signature, CutsLongIdentifiersShortInMessages) {
                                    std::string(199, 'x') + "\xC3\xA4yz");
   EXPECT_EQ(VerdictOf(text),
             "XmlSecurityException: Digest method '" + std::string(199, 'x') + "...' is not accepted");
+  EXPECT_EQ(VerdictOf(Replace(SignedDocument(), kSha256, std::string(200, 'x'))),
+            "XmlSecurityException: Digest method '" + std::string(200, 'x') + "' is not accepted");
 }
 
 TEST(Signature, WithAMethodOfAnotherHashIsRefused) {
