@@ -8,15 +8,13 @@
 
 #include <string_view>
 
+#include "quorlin/cancellation.h"
 #include "quorlin/logging.h"
 #include "quorlin/operationReports.h"
 
 namespace Quorlin {
 
 namespace {
-
-// What a cancelled operation throws is a CommunicationException, told from the others by its text alone.
-constexpr std::string_view kCancelledText = "The operation was cancelled.";
 
 // The innermost operation of this thread.
 thread_local OperationFrame* current = nullptr;
@@ -76,7 +74,8 @@ long long OperationFrame::GetMicroseconds() const {
 
 OperationOutcome Classify(const Pelmar::Exception& error) {
   if (Is<CommunicationException>(error)) {
-    return error.what() == kCancelledText ? OperationOutcome::CANCELLED : OperationOutcome::COMMUNICATION;
+    return std::string_view(error.what()) == kCancelledText ? OperationOutcome::CANCELLED
+                                                            : OperationOutcome::COMMUNICATION;
   }
   if (Is<InvalidCredentialsException>(error)) {
     return OperationOutcome::INVALID_CREDENTIALS;

@@ -12,6 +12,8 @@
 #include <algorithm>
 #include <string>
 
+#include "quorlin/OperationFrame.h"
+#include "quorlin/cancellation.h"
 #include "quorlin/logging.h"
 
 namespace Quorlin {
@@ -22,8 +24,6 @@ using Pelmar::System::CancellationHandle;
 using Pelmar::System::ScheduledItem;
 
 namespace {
-
-constexpr const char* kCancelledText = "The operation was cancelled.";
 
 void Require(bool condition, const std::string& fault) {
   if (!condition) {
@@ -147,6 +147,9 @@ void OptionsSession::RequireGoingOn() const {
 void OptionsSession::SendRequest(const Request& request, Pelmar::Ref<Pelmar::Reader>& response) {
   for (int retry = 0;; ++retry) {
     RequireGoingOn();
+    if (retry > 0) {
+      OperationFrame::CountRetry();
+    }
     Pelmar::Ref<Http::PendingRequestItem> item;
     _userAgent->SendAsync(CreatePost(_settings.endpoint.path, request), &IgnoreOutcome, item);
     const boost::shared_ptr<Pelmar::Exception> failure = Exchange(item, response);

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
+#include <pelmar/system/CancellationHandle.h>
 #include <quorlin/Coroutine.h>
+#include <quorlin/ServiceOptions.h>
 
 #include <gtest/gtest.h>
 #include <boost/make_shared.hpp>
@@ -23,8 +25,10 @@
 #include <vector>
 
 #include "support/FakeService.h"
+#include "support/LoopbackServer.h"
 #include "support/ManualService.h"
 #include "support/RecordingLogSink.h"
+#include "support/RecordingMetrics.h"
 #include "support/ServiceAnswers.h"
 
 namespace Quorlin {
@@ -523,7 +527,8 @@ TEST(CoroutineOnThePool, IsCancelledWhileTheCallWaitsForTheService) {
   const auto sent = std::make_shared<std::promise<void>>();
   std::promise<void> open;
   const std::shared_future<void> opened = open.get_future();
-  fake.transport->SetBeforeAnswer([sent, opened] {
+  Story call;
+  fake.transport->SetBeforeAnswer([sent, opened, witness = call.MakeWitness()] {
     sent->set_value();
     opened.wait();
   });
@@ -537,6 +542,36 @@ TEST(CoroutineOnThePool, IsCancelledWhileTheCallWaitsForTheService) {
   EXPECT_EQ(Lines({kCancelled}), story.GetLines());
   EXPECT_EQ(std::this_thread::get_id(), story.GetThread());
   open.set_value();
+  fake = FakeService();
+  call.AwaitEnd();
+}
+
+// A handle ends the call, and the coroutine goes on where that has ended.
+TEST(CoroutineOnThePool, GoesOnWhenTheHandleOfTheServiceEndsTheCall) {
+  const auto asked = std::make_shared<std::promise<void>>();
+  TestSupport::LoopbackServer server({[asked](TestSupport::ServerConnection& connection) {
+    connection.ReadRequest();
+    asked->set_value();
+    connection.AwaitPeerEnd();
+  }});
+  SecurityTokenServiceConfig config;
+  config.stsUrl = "http://" + server.GetEndpoint() + "/sts";
+  const auto handle = Pelmar::System::CreateCancellationHandle();
+  const auto service =
+      CreateCancellableService(*CreateSecurityTokenService(config, ServiceOptions()), handle);
+  TokenSpec spec;
+  spec.tokenLifetimeSec = 300;
+  std::stop_source stop;
+  const std::stop_callback end(stop.get_token(), [handle] { handle->Cancel(); });
+  const TestSupport::MetricsRecording recording;
+  Story story;
+  Await(story, [&] { return Coroutine::AcquireToken(service, "alice", "pass-word", spec); });
+  asked->get_future().wait();
+  stop.request_stop();
+  story.AwaitEnd();
+  EXPECT_EQ(Lines({kCancelled}), story.GetLines());
+  EXPECT_NE(std::this_thread::get_id(), story.GetThread());
+  EXPECT_EQ(Lines({"AcquireToken cancelled 1"}), recording.metrics->GetLines());
 }
 
 // ---- Everything at the same moment ----
@@ -589,7 +624,7 @@ void Race(Ends ends, int rounds) {
   }
 }
 
-constexpr int kRounds = 2000;
+constexpr int kRounds = 500;
 
 TEST(CoroutineRace, OfResultAndStop) {
   Race(Ends::RESULT_AND_STOP, kRounds);

@@ -24,6 +24,7 @@
 #include "support/LogAction.h"
 #include "support/LoopbackServer.h"
 #include "support/Pki.h"
+#include "support/RecordingMetrics.h"
 #include "support/ServiceAnswers.h"
 
 namespace Quorlin {
@@ -515,13 +516,28 @@ TEST(ServiceRetries, HappenInTheMiddleOfANegotiation) {
                                         }});
   int legs = 0;
   TwoLegs handler([&] { ++legs; });
+  const TestSupport::MetricsRecording recording;
   EXPECT_EQ("_7f5a64e2", Outcome([&] {
               return CreateSecurityTokenService(TlsConfigFor(server), Retrying(1))
                   ->AcquireTokenByGSS(Spec(), handler)
                   ->GetId();
             }));
   EXPECT_EQ(1, legs) << "the handler is not asked again for a message that is sent again";
+  EXPECT_EQ(std::vector<std::string>{"AcquireTokenByGSS success 2"}, recording.metrics->GetLines());
   EXPECT_EQ(3U, server.CountConnections());
+}
+
+TEST(ServiceRetries, AreCountedAsAttemptsOfTheOperation) {
+  const TestSupport::MetricsRecording recording;
+  LoopbackServer broken(TlsSettings(), {BreakOff});
+  Acquire(TlsConfigFor(broken), Retrying(2));
+  LoopbackServer late(TlsSettings(), {BreakOff, AnswerOverTls});
+  Acquire(TlsConfigFor(late), Retrying(2));
+  LoopbackServer prompt(TlsSettings(), {AnswerOverTls});
+  Acquire(TlsConfigFor(prompt), Retrying(2));
+  EXPECT_EQ(std::vector<std::string>(
+                {"AcquireToken communication 3", "AcquireToken success 2", "AcquireToken success 1"}),
+            recording.metrics->GetLines());
 }
 
 TEST(ServiceRetries, PauseLongerEachTimeUpToALimit) {

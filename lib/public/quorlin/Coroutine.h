@@ -45,7 +45,8 @@ namespace Quorlin {
 /// Cancelling: once a stop is requested of the given token, the coroutine goes on with CommunicationException
 /// "The operation was cancelled.", unless the operation has ended before. It goes on exactly once, whichever
 /// comes first. The operation itself runs to its end on its pool thread, and what it brings is dropped; to
-/// end that too, cancel it by the means of the service. Nothing is sent when the stop was requested before.
+/// end that too, cancel it by the handle of the service (ServiceOptions). Nothing is sent when the stop was
+/// requested before.
 ///
 /// Where the coroutine goes on: on the pool thread that the operation ran on, when that has ended; on the
 /// thread that requests the stop, inside request_stop, when that has ended the wait; and without having been
