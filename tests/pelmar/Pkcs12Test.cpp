@@ -6,6 +6,7 @@
 #include "pelmar/crypto/Pkcs12Limits.h"
 #include "pelmar/crypto/Pkcs12Profile.h"
 #include "pelmar/crypto/SignatureValue.h"
+#include "support/GoldenText.h"
 #include "support/Pki.h"
 #include "support/Process.h"
 #include "support/TemporaryDirectory.h"
@@ -14,6 +15,7 @@
 #include <pelmar/crypto/Pkcs12.h>
 #include <pelmar/ssl/SSLContext.h>
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <openssl/pkcs12.h>
@@ -350,6 +352,13 @@ TEST(Pkcs12, IsReadAsTheBuilderOfTheTestsMakesIt) {
   const Identity& leaf = TheFamily().leaf;
   EXPECT_TRUE(
       SignsForItself(ReadPkcs12(FileBuilder().AddKey(leaf).AddCertificate(leaf).Build(), kPassPhrase)));
+}
+
+// The fuzzer changed one bit of the secret half; the public half is still that of the certificate.
+TEST(Pkcs12, RefusesADamagedKey) {
+  const std::string der = TestSupport::ReadVector("pkcs12/damaged-key.p12");
+  EXPECT_THAT([&der] { ReadPkcs12(std::vector<unsigned char>(der.begin(), der.end()), "fuzz"); },
+              testing::ThrowsMessage<CryptoException>("The PKCS #12 file holds a damaged private key"));
 }
 
 TEST(Pkcs12, RefusesTwoKeys) {

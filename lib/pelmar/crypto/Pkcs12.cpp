@@ -9,8 +9,10 @@
 #include "pelmar/crypto/Pkcs12Limits.h"
 #include "pelmar/crypto/Pkcs12Profile.h"
 #include "pelmar/crypto/PrivateKeyImpl.h"
+#include "pelmar/crypto/SignatureValue.h"
 
 #include <pelmar/crypto/CryptoException.h>
+#include <pelmar/crypto/Digest.h>
 
 #include <openssl/evp.h>
 #include <openssl/pkcs12.h>
@@ -84,6 +86,7 @@ class Reader final {
     Pkcs12Content content;
     content.privateKey = _key;
     content.certificate = TakeCertificateOfKey();
+    RequireWorkingKey(content);
     content.chain = TakeIssuersOf(ToCertificateImpl(content.certificate.Get()));
     return content;
   }
@@ -192,6 +195,18 @@ class Reader final {
       Refuse("holds no certificate of its private key");
     }
     return found;
+  }
+
+  // A key belongs to a certificate by its public half, which its file repeats. A secret half that is damaged
+  // shows only in what it signs, and one that is half damaged may give itself away by it (Boneh, DeMillo,
+  // Lipton: faults in the Chinese remainders).
+  void RequireWorkingKey(const Pkcs12Content& content) const {
+    const char trial[] = "trial";
+    const std::vector<unsigned char> value = content.privateKey->Sign(DIGEST_SHA256, trial, sizeof(trial));
+    const std::vector<unsigned char> digest = ComputeDigest(DIGEST_SHA256, trial, sizeof(trial));
+    if (!VerifySignatureValue(content.certificate.Get(), DIGEST_SHA256, digest, value)) {
+      Refuse("holds a damaged private key");
+    }
   }
 
   // Each is taken out as it is found, so that a self-signed one ends the search.
