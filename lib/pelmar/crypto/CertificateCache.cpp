@@ -17,7 +17,10 @@ Ref<const CertificateImpl> CertificateCache::Read(const std::vector<unsigned cha
     return known;
   }
   const Ref<const CertificateImpl> certificate = MakeRef<CertificateImpl>(der);
-  Add(certificate);
+  // What was not understood may be, when there is more memory.
+  if (certificate->IsUnderstood()) {
+    Add(certificate);
+  }
   return certificate;
 }
 

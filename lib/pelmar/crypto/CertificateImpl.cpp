@@ -37,6 +37,28 @@ X509* ParseX509(const std::vector<unsigned char>& der) {
   return x509.release();
 }
 
+/// Whether OpenSSL has made sense of the extensions and of the key, which it reads on its own account. One
+/// that is issued under its own name but not self-signed is rare enough to be doubted.
+bool IsUnderstood(X509* x509) {
+  const bool hasExtensions = X509_check_purpose(x509, -1, 0) == 1;
+  const EVP_PKEY* const key = X509_get0_pubkey(x509);
+  const std::uint32_t flags = X509_get_extension_flags(x509);
+  ClearOpenSslErrors();
+  const bool isDoubtful =
+      (flags & EXFLAG_NO_FINGERPRINT) != 0 || ((flags & EXFLAG_SI) != 0 && (flags & EXFLAG_SS) == 0);
+  return hasExtensions && key != nullptr && EVP_PKEY_get_security_bits(key) > 0 && !isDoubtful;
+}
+
+// When memory runs out meanwhile, OpenSSL takes that for a fault of the certificate, and for good. A second
+// reading tells a certificate that is really like that.
+X509* ReadX509(const std::vector<unsigned char>& der) {
+  X509Handle x509(ParseX509(der));
+  if (!IsUnderstood(x509.get())) {
+    x509.reset(ParseX509(der));
+  }
+  return x509.release();
+}
+
 }  // namespace
 
 Certificate::Certificate() = default;
@@ -49,14 +71,11 @@ void CertificateImpl::X509Deleter::operator()(X509* x509) const noexcept {
 
 CertificateImpl::CertificateImpl(const std::vector<unsigned char>& der)
     : _der(der),
-      _x509(ParseX509(der)),
+      _x509(ReadX509(der)),
+      _isUnderstood(Crypto::IsUnderstood(_x509.get())),
       _sha256(ComputeDigest(DIGEST_SHA256, der.data(), der.size())),
       _notBefore(ReadX509Time(X509_get0_notBefore(_x509.get()))),
-      _notAfter(ReadX509Time(X509_get0_notAfter(_x509.get()))) {
-  // Makes OpenSSL read the extensions now. Whether they are acceptable is for chain verification to say.
-  X509_check_purpose(_x509.get(), -1, 0);
-  ClearOpenSslErrors();
-}
+      _notAfter(ReadX509Time(X509_get0_notAfter(_x509.get()))) {}
 
 CertificateImpl::~CertificateImpl() = default;
 

@@ -41,6 +41,9 @@ class CertificateImpl final : public Certificate {
 
   /// OpenSSL's object, owned by this one. Only the crypto and ssl layers touch it, and they do not change it.
   x509_st* GetX509() const noexcept { return _x509.get(); }
+  /// Whether OpenSSL could read its key and extensions. Whether they are acceptable is for chain verification
+  /// to say.
+  bool IsUnderstood() const noexcept { return _isUnderstood; }
   /// The subject's public key, owned by this object; null when OpenSSL does not know such keys.
   evp_pkey_st* GetPublicKey() const noexcept;
   /// Of the public key; the certificate stays the same whatever is taken or given.
@@ -55,6 +58,7 @@ class CertificateImpl final : public Certificate {
 
   std::vector<unsigned char> _der;
   std::unique_ptr<x509_st, X509Deleter> _x509;
+  bool _isUnderstood;
   std::vector<unsigned char> _sha256;
   System::DateTime _notBefore;
   System::DateTime _notAfter;

@@ -23,5 +23,14 @@ void ThrowOpenSslError(const std::string& what) {
   throw CryptoException(message);
 }
 
+void ThrowIfMemoryRanOut(const std::string& what) {
+  while (const unsigned long code = ERR_get_error()) {
+    if (ERR_GET_REASON(code) == ERR_R_MALLOC_FAILURE) {
+      ERR_clear_error();
+      throw CryptoException(what + ": " + ERR_reason_error_string(code));
+    }
+  }
+}
+
 }  // namespace Crypto
 }  // namespace Pelmar

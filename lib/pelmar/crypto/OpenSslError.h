@@ -19,6 +19,10 @@ void ClearOpenSslErrors() noexcept;
 /// one. The queue is empty afterwards. OpenSSL's reasons are fixed texts; none holds data of ours.
 [[noreturn]] void ThrowOpenSslError(const std::string& what);
 
+/// Throws CryptoException ("`what`: malloc failure") when one of OpenSSL's errors on this thread is a lack of
+/// memory. Clears them either way.
+void ThrowIfMemoryRanOut(const std::string& what);
+
 }  // namespace Crypto
 }  // namespace Pelmar
 

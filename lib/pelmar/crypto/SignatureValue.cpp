@@ -35,7 +35,10 @@ bool IsSignature(EVP_PKEY_CTX* context, const std::vector<unsigned char>& digest
                  const std::vector<unsigned char>& value) {
   const int verdict = EVP_PKEY_verify(context, value.data(), value.size(), digest.data(), digest.size());
   // 0 and negative numbers both come for wrong values (of another size, with bad padding); what is not proven
-  // is wrong.
+  // is wrong. But a lack of memory shall not be told as a forgery.
+  if (verdict != 1) {
+    ThrowIfMemoryRanOut("Signature verification failed");
+  }
   ClearOpenSslErrors();
   return verdict == 1;
 }

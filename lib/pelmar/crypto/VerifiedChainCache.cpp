@@ -6,7 +6,6 @@
 #include "pelmar/crypto/DigestWriter.h"
 
 #include <cstdint>
-#include <iterator>
 
 namespace Pelmar {
 namespace Crypto {
@@ -63,8 +62,9 @@ void VerifiedChainCache::Add(const ChainFingerprint& fingerprint, const Ref<cons
     _places.erase(_entries.front().fingerprint);
     _entries.pop_front();
   }
-  _entries.push_back(Entry{fingerprint, signer, validity});
-  _places.emplace(fingerprint, std::prev(_entries.end()));
+  std::list<Entry> entry(1, Entry{fingerprint, signer, validity});
+  _places.emplace(fingerprint, entry.begin());
+  _entries.splice(_entries.end(), entry);
 }
 
 // Never destroyed: a resolver may still be at work on another thread while the process ends.

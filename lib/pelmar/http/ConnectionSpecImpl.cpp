@@ -21,6 +21,12 @@ std::uint64_t DrawId() {
   return ++last;
 }
 
+LoopCommands MakeFarewell(std::uint64_t id) {
+  // Made with the first spec: to be without memory is for a constructor to tell, not for a destructor.
+  HttpLoop::Get();
+  return HttpLoop::MakeFarewell(LoopVerb::DROP_SPEC, id);
+}
+
 void RequireHost(const std::string& host) {
   const std::string fault = FindHostFault(host);
   if (!fault.empty()) {
@@ -33,7 +39,7 @@ void RequireHost(const std::string& host) {
 ConnectionSpec::~ConnectionSpec() = default;
 
 ConnectionSpecImpl::ConnectionSpecImpl(const std::string& host, int port)
-    : _host(host), _port(port), _serverName(host), _id(DrawId()) {}
+    : _host(host), _port(port), _serverName(host), _id(DrawId()), _farewell(MakeFarewell(_id)) {}
 
 ConnectionSpecImpl::ConnectionSpecImpl(const ConnectionSpecImpl& tcp,
                                        const Ref<const Ssl::SSLContextImpl>& context,
@@ -43,10 +49,11 @@ ConnectionSpecImpl::ConnectionSpecImpl(const ConnectionSpecImpl& tcp,
       _serverName(tlsHost),
       _context(context),
       _pins(pins),
-      _id(DrawId()) {}
+      _id(DrawId()),
+      _farewell(MakeFarewell(_id)) {}
 
 ConnectionSpecImpl::~ConnectionSpecImpl() {
-  HttpLoop::Get().DropSpec(_id);
+  HttpLoop::Get().TakeFarewell(_farewell);
 }
 
 std::string ConnectionSpecImpl::GetEndpoint() const {

@@ -8,6 +8,7 @@
 
 #include <pelmar/http/Client.h>
 
+#include "pelmar/http/LoopCommand.h"
 #include "pelmar/ssl/SSLContextImpl.h"
 
 #include <cstdint>
@@ -45,6 +46,7 @@ class ConnectionSpecImpl final : public ConnectionSpec {
   const Ref<const Ssl::SSLContextImpl> _context;
   const std::string _pins;
   const std::uint64_t _id;
+  LoopCommands _farewell;  // To the HTTP loop.
 };
 
 /// Throws InvalidArgumentException when `spec` is null or of a foreign class.

@@ -41,7 +41,9 @@ Ref<Exchange> Exchange::Create(const AgentParts& agent, RequestParts request,
 }
 
 Exchange::Exchange(const AgentParts& agent, RequestParts&& request)
-    : _agent(agent), _request(std::move(request)) {}
+    : _agent(agent),
+      _request(std::move(request)),
+      _abandonment(1, LoopCommand{LoopVerb::ABANDON, nullptr, 0}) {}
 
 Exchange::~Exchange() = default;
 

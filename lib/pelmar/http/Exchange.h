@@ -13,6 +13,7 @@
 #include "pelmar/http/ClientRequestImpl.h"
 #include "pelmar/http/ConnectionSpecImpl.h"
 #include "pelmar/http/CookieStoreImpl.h"
+#include "pelmar/http/LoopCommand.h"
 
 #include <boost/function.hpp>
 
@@ -21,6 +22,7 @@
 #include <list>
 #include <memory>
 #include <mutex>
+#include <utility>
 
 namespace Pelmar {
 namespace Http {
@@ -67,6 +69,9 @@ class Exchange final : public PendingRequestItem {
   /// The response, or throws the error. Only after settling.
   Ref<ClientResponse> GetResult() const;
 
+  /// For the HTTP loop, once: a command made in advance, as giving up must not fail for lack of memory.
+  LoopCommands TakeAbandonment() noexcept { return std::move(_abandonment); }
+
   const AgentParts& GetAgent() const { return _agent; }
   const RequestParts& GetRequest() const { return _request; }
 
@@ -78,6 +83,7 @@ class Exchange final : public PendingRequestItem {
 
   const AgentParts _agent;
   const RequestParts _request;
+  LoopCommands _abandonment;  // Whoever settles the exchange may take it.
 
   mutable std::mutex _mutex;
   std::condition_variable _wake;

@@ -4,12 +4,14 @@
 #include "pelmar/http/HttpLoop.h"
 
 #include "pelmar/http/CurlMemory.h"
+#include "pelmar/http/SpareFailures.h"
 
 #include <pelmar/http/HttpException.h>
 #include <pelmar/system/ThreadPool.h>
 
 #include <curl/curl.h>
 #include <pthread.h>
+#include <unistd.h>
 
 #include <csignal>
 #include <ctime>
@@ -75,36 +77,34 @@ HttpLoop::~HttpLoop() {
 }
 
 void HttpLoop::Submit(const Ref<Exchange>& exchange) {
+  if (IsInForkedChild()) {
+    throw HttpException(
+        "The HTTP client was started before this process was forked, and works in the parent only");
+  }
+  LoopCommands command(1, LoopCommand{LoopVerb::SUBMIT, exchange, 0});
   {
     const std::lock_guard<std::mutex> lock(_mutex);
     if (!_stopped && !_thread.joinable()) {
       StartThread();
     }
   }
-  if (!Post({Verb::SUBMIT, exchange, 0})) {
-    exchange->Settle(std::make_shared<const HttpException>("Request was cancelled: the process ends"),
-                     nullptr);
+  if (!Post(command)) {
+    exchange->Settle(GetSpareFailures().processEnds, nullptr);
   }
 }
 
-void HttpLoop::Abandon(const Ref<Exchange>& exchange) {
-  Post({Verb::ABANDON, exchange, 0});
+void HttpLoop::Abandon(const Ref<Exchange>& exchange) noexcept {
+  LoopCommands command = exchange->TakeAbandonment();
+  command.front().exchange = exchange;
+  Post(command);
 }
 
-void HttpLoop::DropAgent(std::uint64_t agent) noexcept {
-  try {
-    Post({Verb::DROP_AGENT, nullptr, agent});
-  } catch (const std::exception&) {
-    // Out of memory: its idle connections stay until their servers close them.
-  }
+LoopCommands HttpLoop::MakeFarewell(LoopVerb verb, std::uint64_t id) {
+  return LoopCommands(1, LoopCommand{verb, nullptr, id});
 }
 
-void HttpLoop::DropSpec(std::uint64_t spec) noexcept {
-  try {
-    Post({Verb::DROP_SPEC, nullptr, spec});
-  } catch (const std::exception&) {
-    // Out of memory: its TLS sessions stay until the process ends.
-  }
+void HttpLoop::TakeFarewell(LoopCommands& farewell) noexcept {
+  Post(farewell);
 }
 
 void HttpLoop::Deliver(Work work) {
@@ -122,6 +122,9 @@ void HttpLoop::Deliver(Work work) {
 }
 
 void HttpLoop::Shutdown() {
+  if (IsInForkedChild()) {
+    return;
+  }
   std::thread thread;
   Work dropped;
   {
@@ -138,19 +141,23 @@ void HttpLoop::Shutdown() {
   }
 }
 
-/// False when there is no thread to obey.
-bool HttpLoop::Post(Command command) {
+/// False, and the command still with the caller, when there is no thread to obey.
+bool HttpLoop::Post(LoopCommands& command) noexcept {
+  if (IsInForkedChild()) {
+    return false;
+  }
   const std::lock_guard<std::mutex> lock(_mutex);
   if (_stopped || !_thread.joinable()) {
     return false;
   }
-  _commands.push_back(std::move(command));
+  _commands.splice(_commands.end(), command);
   _poller->Wake();
   return true;
 }
 
 /// Called with the lock held.
 void HttpLoop::StartThread() {
+  GetSpareFailures();
   if (!InitializeCurl()) {
     throw HttpException("The HTTP engine cannot be set up");
   }
@@ -160,6 +167,7 @@ void HttpLoop::StartThread() {
     }
     const SignalBlock block;
     _thread = std::thread([this] { Run(); });
+    _process = ::getpid();
   } catch (const std::system_error& e) {
     curl_global_cleanup();
     throw HttpException(std::string("The HTTP client cannot start a thread: ") + e.what());
@@ -169,12 +177,17 @@ void HttpLoop::StartThread() {
   }
 }
 
-void HttpLoop::Run() {
+bool HttpLoop::IsInForkedChild() const noexcept {
+  const pid_t process = _process;
+  return process != 0 && process != ::getpid();
+}
+
+void HttpLoop::Run() noexcept {
   {
     LaneSet lanes(*_poller, _getTime);
-    std::vector<Command> commands;
+    LoopCommands commands;
     while (TakeCommands(commands)) {
-      for (const Command& command : commands) {
+      for (const LoopCommand& command : commands) {
         Obey(command, lanes);
       }
       // Released before the wait: a command holds what it is about.
@@ -182,10 +195,9 @@ void HttpLoop::Run() {
       lanes.Turn(Redeliver() ? kRedeliverMilliseconds : kNoLimit);
     }
     // Those that came too late to be started end like those that run.
-    for (const Command& command : commands) {
-      if (command.verb == Verb::SUBMIT) {
-        command.exchange->Settle(
-            std::make_shared<const HttpException>("Request was cancelled: the process ends"), nullptr);
+    for (const LoopCommand& command : commands) {
+      if (command.verb == LoopVerb::SUBMIT) {
+        command.exchange->Settle(GetSpareFailures().processEnds, nullptr);
       }
     }
   }
@@ -193,24 +205,24 @@ void HttpLoop::Run() {
 }
 
 /// False when the loop is to end.
-bool HttpLoop::TakeCommands(std::vector<Command>& commands) {
+bool HttpLoop::TakeCommands(LoopCommands& commands) {
   const std::lock_guard<std::mutex> lock(_mutex);
   commands.swap(_commands);
   return !_stopped;
 }
 
-void HttpLoop::Obey(const Command& command, LaneSet& lanes) {
+void HttpLoop::Obey(const LoopCommand& command, LaneSet& lanes) {
   switch (command.verb) {
-    case Verb::SUBMIT:
+    case LoopVerb::SUBMIT:
       lanes.Submit(command.exchange);
       break;
-    case Verb::ABANDON:
+    case LoopVerb::ABANDON:
       lanes.Abandon(*command.exchange);
       break;
-    case Verb::DROP_AGENT:
+    case LoopVerb::DROP_AGENT:
       lanes.DropAgent(command.id);
       break;
-    case Verb::DROP_SPEC:
+    case LoopVerb::DROP_SPEC:
       lanes.DropSpec(command.id);
       break;
   }

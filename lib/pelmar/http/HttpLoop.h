@@ -8,23 +8,28 @@
 
 #include "pelmar/http/Exchange.h"
 #include "pelmar/http/LaneSet.h"
+#include "pelmar/http/LoopCommand.h"
 #include "pelmar/http/Poller.h"
 
 #include <boost/function.hpp>
 
+#include <sys/types.h>
+
+#include <atomic>
 #include <cstdint>
 #include <functional>
 #include <memory>
 #include <mutex>
 #include <thread>
-#include <vector>
 
 namespace Pelmar {
 namespace Http {
 
 /// Starts with the first request. Every libcurl object lives on its thread; other threads leave commands in a
 /// queue. It runs no code of a caller: completion functors go to the thread pool. When the process exits,
-/// requests still pending end with an HttpException, and so do those sent later.
+/// requests still pending end with an HttpException, and so do those sent later. A forked child has no such
+/// thread: there requests are refused, and the rest is passed over without touching what the parent's threads
+/// may have locked.
 class HttpLoop final {
  public:
   /// Hands work to the thread pool; throws when the pool cannot take it now.
@@ -41,13 +46,14 @@ class HttpLoop final {
   /// The process's loop. Never destroyed: objects that end with the process may still call it.
   static HttpLoop& Get();
 
-  /// Starts the exchange. Throws HttpException when the loop cannot be started.
+  /// Starts the exchange. Throws HttpException when the loop cannot be started, or in a forked child.
   void Submit(const Ref<Exchange>& exchange);
-  /// Closes the connection of an exchange that was settled elsewhere.
-  void Abandon(const Ref<Exchange>& exchange);
-  /// The agent, or the spec and all its agents, are gone.
-  void DropAgent(std::uint64_t agent) noexcept;
-  void DropSpec(std::uint64_t spec) noexcept;
+  /// Closes the connection of an exchange that was settled elsewhere. Once for each exchange.
+  void Abandon(const Ref<Exchange>& exchange) noexcept;
+  /// To be made with the agent or spec, and given back when it is gone: for an agent to close its
+  /// connections, for a spec, whose agents are gone by then, to forget its TLS sessions.
+  static LoopCommands MakeFarewell(LoopVerb verb, std::uint64_t id);
+  void TakeFarewell(LoopCommands& farewell) noexcept;
 
   /// Queues work on the thread pool. If the pool cannot take it now, the loop tries again until it can. Work
   /// that comes after the shutdown is destroyed.
@@ -57,27 +63,21 @@ class HttpLoop final {
   void Shutdown();
 
  private:
-  enum class Verb { SUBMIT, ABANDON, DROP_AGENT, DROP_SPEC };
-
-  struct Command {
-    Verb verb;
-    Ref<Exchange> exchange;
-    std::uint64_t id;
-  };
-
-  bool Post(Command command);
+  bool Post(LoopCommands& command) noexcept;
   void StartThread();
-  void Run();
-  bool TakeCommands(std::vector<Command>& commands);
-  static void Obey(const Command& command, LaneSet& lanes);
+  bool IsInForkedChild() const noexcept;
+  void Run() noexcept;
+  bool TakeCommands(LoopCommands& commands);
+  static void Obey(const LoopCommand& command, LaneSet& lanes);
   /// Whether something is left to deliver.
   bool Redeliver();
 
   const QueueFunction _queue;
   const LaneSet::GetTimeFunction _getTime;
+  std::atomic<pid_t> _process{0};  // Where the thread was started.
   std::mutex _mutex;
   // All below are guarded by the mutex.
-  std::vector<Command> _commands;
+  LoopCommands _commands;
   Work _undelivered;
   std::unique_ptr<Poller> _poller;  // Made once; the loop's thread waits on it without the mutex.
   std::thread _thread;

@@ -3,6 +3,8 @@
 
 #include "pelmar/http/Lane.h"
 
+#include "pelmar/http/SpareFailures.h"
+
 #include <algorithm>
 #include <exception>
 #include <iterator>
@@ -15,10 +17,6 @@ namespace {
 
 constexpr int kRefuse = -1;
 constexpr int kAccept = 0;
-
-void SettleAsFailed(Exchange& exchange, const char* text) {
-  exchange.Settle(std::make_shared<const HttpException>(text), nullptr);
-}
 
 }  // namespace
 
@@ -33,7 +31,7 @@ Lane::Lane(Poller& poller, SocketOwners& owners)
 }
 
 Lane::~Lane() {
-  FailAll("Request was cancelled: the process ends");
+  FailAll(GetSpareFailures().processEnds);
   _multi.reset();
   for (auto owner = _owners.begin(); owner != _owners.end();) {
     owner = owner->second == this ? _owners.erase(owner) : std::next(owner);
@@ -74,15 +72,15 @@ void Lane::Act(curl_socket_t socket, int what) {
   const CURLMcode code = curl_multi_socket_action(_multi.get(), socket, what, &running);
   CollectFinished();
   if (code != CURLM_OK) {
-    FailAll("The HTTP engine broke down");
+    FailAll(GetSpareFailures().engineBrokeDown);
   }
 }
 
-void Lane::FailAll(const char* text) {
+void Lane::FailAll(const std::shared_ptr<const HttpException>& failure) {
   while (!_transfers.empty()) {
     const Ref<Exchange> exchange = _transfers.begin()->second->GetExchange();
     Remove(_transfers.begin());
-    SettleAsFailed(*exchange, text);
+    exchange->Settle(failure, nullptr);
   }
 }
 
@@ -103,7 +101,7 @@ void Lane::Finish(CURL* easy, CURLcode code) {
   try {
     place->second->Finish(code);
   } catch (const std::exception&) {
-    SettleAsFailed(*place->second->GetExchange(), "Out of memory");
+    place->second->GetExchange()->Settle(GetSpareFailures().outOfMemory, nullptr);
   }
   Remove(place);
 }

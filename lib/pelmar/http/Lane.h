@@ -55,7 +55,7 @@ class Lane final {
   static int OnTimer(CURLM* multi, long timeoutMilliseconds, void* lane) noexcept;
 
   void Act(curl_socket_t socket, int what);
-  void FailAll(const char* text);
+  void FailAll(const std::shared_ptr<const HttpException>& failure);
   void CollectFinished();
   void Finish(CURL* easy, CURLcode code);
   void Remove(std::map<CURL*, std::unique_ptr<Transfer>>::iterator transfer);

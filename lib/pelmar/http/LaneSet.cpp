@@ -3,6 +3,8 @@
 
 #include "pelmar/http/LaneSet.h"
 
+#include "pelmar/http/SpareFailures.h"
+
 #include <algorithm>
 #include <exception>
 #include <iterator>
@@ -30,13 +32,24 @@ void LaneSet::Submit(const Ref<Exchange>& exchange) {
   if (exchange->IsSettled()) {
     return;
   }
+  const std::shared_ptr<const HttpException> failure = TryStart(exchange);
+  if (failure) {
+    exchange->Settle(failure, nullptr);
+  }
+}
+
+/// Null when it has started.
+std::shared_ptr<const HttpException> LaneSet::TryStart(const Ref<Exchange>& exchange) noexcept {
   try {
     const AgentParts& agent = exchange->GetAgent();
-    GetLane(agent.id).Start(exchange, _shares[agent.spec->GetId()].Get(_getTime()));
-  } catch (const HttpException& e) {
-    exchange->Settle(std::make_shared<const HttpException>(e), nullptr);
+    try {
+      GetLane(agent.id).Start(exchange, _shares[agent.spec->GetId()].Get(_getTime()));
+      return nullptr;
+    } catch (const HttpException& e) {
+      return std::make_shared<const HttpException>(e);
+    }
   } catch (const std::exception&) {
-    exchange->Settle(std::make_shared<const HttpException>("Out of memory"), nullptr);
+    return GetSpareFailures().outOfMemory;
   }
 }
 

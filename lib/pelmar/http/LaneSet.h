@@ -48,6 +48,7 @@ class LaneSet final {
     bool isOrphan;
   };
 
+  std::shared_ptr<const HttpException> TryStart(const Ref<Exchange>& exchange) noexcept;
   Lane& GetLane(std::uint64_t agent);
   int GetTimeout(int maxMilliseconds) const;
   void RunDeadlines();

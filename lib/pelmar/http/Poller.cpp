@@ -20,7 +20,11 @@ constexpr int kMaxEventsPerWait = 64;
 
 }  // namespace
 
-Poller::Poller() : _epoll(::epoll_create1(EPOLL_CLOEXEC)), _wake(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
+Poller::Poller() {
+  // Taken now, as there may be none when events come.
+  _events.reserve(kMaxEventsPerWait);
+  _epoll = ::epoll_create1(EPOLL_CLOEXEC);
+  _wake = ::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
   if (_epoll < 0 || _wake < 0 || !Watch(_wake, true, false)) {
     ::close(_epoll);
     ::close(_wake);

@@ -39,8 +39,8 @@ class Poller final {
  private:
   void Drain();
 
-  int _epoll;
-  int _wake;
+  int _epoll = -1;
+  int _wake = -1;
   std::vector<SocketEvent> _events;
 };
 

@@ -149,8 +149,17 @@ void FreeCompanion(void*, void* companion, CRYPTO_EX_DATA*, int, long, void*) {
   delete static_cast<Companion*>(companion);
 }
 
+/// Throws where there is none, so that it is asked for again.
+int DrawCompanionIndex() {
+  const int index = SSL_CTX_get_ex_new_index(0, nullptr, nullptr, nullptr, FreeCompanion);
+  if (index < 0) {
+    Crypto::ThrowOpenSslError("TLS cannot be set up");
+  }
+  return index;
+}
+
 int GetCompanionIndex() {
-  static const int index = SSL_CTX_get_ex_new_index(0, nullptr, nullptr, nullptr, FreeCompanion);
+  static const int index = DrawCompanionIndex();
   return index;
 }
 
@@ -170,20 +179,27 @@ TlsAlert ClassifyAlert(int code) {
   }
 }
 
-void RecordAlert(const SSL* connection, int where, int value) {
+void RecordFatalAlert(int value, bool isFromServer, TlsRecord& record) noexcept {
+  record.alert = ClassifyAlert(value & 0xff);
+  record.isAlertFromServer = isFromServer;
+  try {
+    record.alertText = SSL_alert_desc_string_long(value);
+  } catch (const std::exception&) {
+    // Out of memory: the message will say less. No exception may pass through OpenSSL.
+  }
+}
+
+void RecordAlert(const SSL* connection, int where, int value) noexcept {
   constexpr int kFatal = 2;
   if ((where & SSL_CB_ALERT) == 0) {
     return;
   }
   TlsRecord& record = *GetCompanion(connection).record;
   const bool isFromServer = (where & SSL_CB_READ) != 0;
-  const int code = value & 0xff;
-  if (code == SSL_AD_CLOSE_NOTIFY) {
+  if ((value & 0xff) == SSL_AD_CLOSE_NOTIFY) {
     record.hasServerEnded = record.hasServerEnded || isFromServer;
   } else if ((value >> 8) == kFatal) {
-    record.alert = ClassifyAlert(code);
-    record.alertText = SSL_alert_desc_string_long(value);
-    record.isAlertFromServer = isFromServer;
+    RecordFatalAlert(value, isFromServer, record);
   }
 }
 

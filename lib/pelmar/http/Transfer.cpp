@@ -4,6 +4,7 @@
 #include "pelmar/http/Transfer.h"
 
 #include "pelmar/http/ClientResponseImpl.h"
+#include "pelmar/http/SpareFailures.h"
 #include "pelmar/http/UrlSyntax.h"
 
 #include <pelmar/StringUtil.h>
@@ -220,18 +221,19 @@ void Transfer::SetCookies() {
 
 // Returning less than was offered makes the engine give the exchange up. No exception may pass through it.
 std::size_t Transfer::OnHeader(char* data, std::size_t size, std::size_t count, void* transfer) noexcept {
+  auto* const self = static_cast<Transfer*>(transfer);
   try {
-    auto* const self = static_cast<Transfer*>(transfer);
     self->NoteConnection();
     return self->_head.TakeLine(data, size * count) == HeadFault::NONE ? size * count : 0;
   } catch (const std::exception&) {
+    self->_lacksMemory = true;
     return 0;
   }
 }
 
 std::size_t Transfer::OnBody(char* data, std::size_t size, std::size_t count, void* transfer) noexcept {
+  auto* const self = static_cast<Transfer*>(transfer);
   try {
-    auto* const self = static_cast<Transfer*>(transfer);
     if (size * count > kMaxResponseBytes - self->_body.size()) {
       self->_isBodyTooLarge = true;
       return 0;
@@ -239,6 +241,7 @@ std::size_t Transfer::OnBody(char* data, std::size_t size, std::size_t count, vo
     self->_body.append(data, size * count);
     return size * count;
   } catch (const std::exception&) {
+    self->_lacksMemory = true;
     return 0;
   }
 }
@@ -252,9 +255,9 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
                  self->_shared.expiry);
     return CURLE_OK;
   } catch (const Exception& e) {
-    self->_tlsSetupFault = e.what();
+    self->NoteTlsSetupFault(e.what());
   } catch (const std::exception&) {
-    self->_tlsSetupFault = "TLS cannot be set up";
+    self->NoteTlsSetupFault("TLS cannot be set up");
   }
   return CURLE_SSL_CERTPROBLEM;
 }
@@ -262,6 +265,14 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
 int Transfer::OnReady(void* transfer, char*, char*, int, int) noexcept {
   static_cast<Transfer*>(transfer)->_wasReady = true;
   return CURL_PREREQFUNC_OK;
+}
+
+void Transfer::NoteTlsSetupFault(const char* text) noexcept {
+  try {
+    _tlsSetupFault = text;
+  } catch (const std::exception&) {
+    // Out of memory; what the engine then says has to do.
+  }
 }
 
 void Transfer::Finish(CURLcode code) {
@@ -306,6 +317,10 @@ bool Transfer::HasSucceeded(CURLcode code) const {
 }
 
 void Transfer::SettleAsFailed(CURLcode code) {
+  if (_lacksMemory) {
+    _exchange->Settle(GetSpareFailures().outOfMemory, nullptr);
+    return;
+  }
   if (!_tlsSetupFault.empty()) {
     _exchange->Settle(std::make_shared<const HttpException>(_tlsSetupFault), nullptr);
     return;

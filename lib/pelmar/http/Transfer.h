@@ -54,6 +54,7 @@ class Transfer final {
   static CURLcode OnTlsContext(CURL* easy, void* tls, void* transfer) noexcept;
   static int OnReady(void* transfer, char*, char*, int, int) noexcept;
 
+  void NoteTlsSetupFault(const char* text) noexcept;
   void NoteConnection();
   void SaveCookies();
   bool HasSucceeded(CURLcode code) const;
@@ -72,6 +73,7 @@ class Transfer final {
   bool _isBodyTooLarge = false;
   bool _wasReady = false;  // A connection stood, and the request was about to be sent.
   bool _hasTlsStarted = false;
+  bool _lacksMemory = false;  // For what has come.
   std::shared_ptr<TlsRecord> _tls;
   std::shared_ptr<const TlsRecord> _connectionTls;  // Another's if the connection was open already.
   std::string _tlsSetupFault;

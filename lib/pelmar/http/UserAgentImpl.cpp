@@ -28,10 +28,11 @@ UserAgent::~UserAgent() = default;
 
 UserAgentImpl::UserAgentImpl(const Ref<const ConnectionSpecImpl>& spec, const Ref<CookieStoreImpl>& cookies,
                              const ClientOptions& options)
-    : _parts{DrawId(), spec, cookies, std::make_shared<const AgentOptions>(options)} {}
+    : _parts{DrawId(), spec, cookies, std::make_shared<const AgentOptions>(options)},
+      _farewell(HttpLoop::MakeFarewell(LoopVerb::DROP_AGENT, _parts.id)) {}
 
 UserAgentImpl::~UserAgentImpl() {
-  HttpLoop::Get().DropAgent(_parts.id);
+  HttpLoop::Get().TakeFarewell(_farewell);
 }
 
 void UserAgentImpl::SendAsync(const Ref<ClientRequest>& request, const CompletionFunctor& completion,

@@ -27,6 +27,7 @@ class UserAgentImpl final : public UserAgent {
   ~UserAgentImpl() override;
 
   const AgentParts _parts;
+  LoopCommands _farewell;  // To the HTTP loop.
 };
 
 }  // namespace Http

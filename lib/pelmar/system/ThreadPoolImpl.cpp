@@ -7,6 +7,8 @@
 
 #include "pelmar/system/EscapedException.h"
 
+#include <unistd.h>
+
 #include <exception>
 #include <system_error>
 #include <utility>
@@ -42,6 +44,10 @@ void ThreadPoolImpl::Queue(const boost::function<void()>& work) {
   if (work.empty()) {
     throw InvalidArgumentException("the work item is empty");
   }
+  if (IsInForkedChild()) {
+    throw Exception(
+        "The thread pool was started before this process was forked, and works in the parent only");
+  }
   // Copied before the lock and, where it is dropped, destroyed after it.
   Works item(1, work);
   const std::lock_guard<std::mutex> lock(_mutex);
@@ -60,6 +66,9 @@ void ThreadPoolImpl::Queue(const boost::function<void()>& work) {
 }
 
 void ThreadPoolImpl::Shutdown() {
+  if (IsInForkedChild()) {
+    return;
+  }
   Works dropped;
   Threads threads;
   {
@@ -72,6 +81,12 @@ void ThreadPoolImpl::Shutdown() {
   _wake.notify_all();
   dropped.clear();
   JoinAll(threads);
+}
+
+// Asked before the lock, which a thread of the parent may have held at the fork.
+bool ThreadPoolImpl::IsInForkedChild() const noexcept {
+  const pid_t process = _process;
+  return process != 0 && process != ::getpid();
 }
 
 std::size_t ThreadPoolImpl::CountThreads() const {
@@ -101,6 +116,7 @@ bool ThreadPoolImpl::TryStartThread(std::string& failure) {
   const auto self = _threads.emplace(_threads.end());
   try {
     *self = _settings.startThread([this, self] { Run(self); });
+    _process = ::getpid();
     return true;
   } catch (const std::exception& e) {
     failure = e.what();

@@ -8,6 +8,9 @@
 
 #include <pelmar/system/ThreadPool.h>
 
+#include <sys/types.h>
+
+#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <cstddef>
@@ -44,11 +47,13 @@ class ThreadPoolImpl final : public ThreadPool {
   ~ThreadPoolImpl();
 
   /// After `Shutdown` the item is destroyed without being run. Throws Pelmar::Exception when the pool has no
-  /// thread and none can be started; while it has one, the item waits for that.
+  /// thread and none can be started; while it has one, the item waits for that. Throws it too in a forked
+  /// child of the process that started the first thread, for there are none of them.
   void Queue(const boost::function<void()>& work) override;
 
   /// Destroys what is queued without running it and waits for what runs. On a thread of the pool (an item
-  /// that ends the process) it waits for the other items only. A second call does nothing.
+  /// that ends the process) it waits for the other items only. A second call does nothing, nor does one in a
+  /// forked child.
   void Shutdown();
 
   /// How many threads there are now, busy and idle.
@@ -61,6 +66,7 @@ class ThreadPoolImpl final : public ThreadPool {
   using Works = std::list<Work>;
   using Threads = std::list<std::thread>;
 
+  bool IsInForkedChild() const noexcept;
   void StartThreadIfNeeded();
   bool TryStartThread(std::string& failure);
   void Run(Threads::iterator self) noexcept;
@@ -69,6 +75,7 @@ class ThreadPoolImpl final : public ThreadPool {
   void Retire(Threads::iterator self, std::unique_lock<std::mutex>& lock);
 
   const ThreadPoolSettings _settings;
+  std::atomic<pid_t> _process{0};  // Where the first thread was started.
   mutable std::mutex _mutex;
   std::condition_variable _wake;
   // All below are guarded by the mutex.
