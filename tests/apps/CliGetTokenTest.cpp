@@ -17,6 +17,7 @@
 #include <atomic>
 #include <filesystem>
 #include <memory>
+#include <mutex>
 #include <regex>
 #include <string>
 #include <vector>
@@ -64,7 +65,10 @@ class World {
   }
   int CountRequests() const { return _requests; }
   /// What the last request asked for, in the service's words.
-  std::string GetLastOperation() const { return _lastOperation; }
+  std::string GetLastOperation() const {
+    const std::lock_guard<std::mutex> lock(_mutex);
+    return _lastOperation;
+  }
 
   /// The owner of the key's token, with another lifetime.
   std::string AcquireShort(long long lifetimeSec, bool byKey) {
@@ -110,16 +114,20 @@ class World {
     config.directory = DevSts::Directory({robot, alice});
     config.log = [this](const std::string& line) {
       ++_requests;
-      std::smatch match;
-      if (std::regex_search(line, match, std::regex("\"operation\":\"([a-z]*)\""))) {
-        _lastOperation = match[1];
+      const std::string name = "\"operation\":\"";
+      const std::size_t place = line.find(name);
+      if (place != std::string::npos) {
+        const std::size_t start = place + name.size();
+        const std::lock_guard<std::mutex> lock(_mutex);
+        _lastOperation = line.substr(start, line.find('"', start) - start);
       }
     };
     return config;
   }
 
   std::atomic<int> _requests{0};
-  std::string _lastOperation;  // Read when no request is on its way.
+  mutable std::mutex _mutex;
+  std::string _lastOperation;  // Guarded by the mutex.
   TestSupport::Identity _identity;
   ServiceWithFiles _world;
 };

@@ -150,10 +150,10 @@ class Sweep final {
 
  private:
   void Work() {
-    // A little beyond the end: sizes of TLS messages vary.
-    constexpr std::size_t kSlack = 8;
-    const std::size_t towardsServer = _sizes[0] + kSlack;
-    for (std::size_t i = _next++ * _step; i < towardsServer + _sizes[1] + kSlack; i = _next++ * _step) {
+    // A little beyond the end, as sizes of TLS messages vary; and so far that a step falls there.
+    const std::size_t slack = 8 + _step;
+    const std::size_t towardsServer = _sizes[0] + slack;
+    for (std::size_t i = _next++ * _step; i < towardsServer + _sizes[1] + slack; i = _next++ * _step) {
       Check(i < towardsServer ? FaultPlan{_fault, false, i} : FaultPlan{_fault, true, i - towardsServer});
     }
   }
