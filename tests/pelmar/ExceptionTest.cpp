@@ -7,6 +7,7 @@
 #include <pelmar/system/DateTime.h>
 
 #include "pelmar/core/Backtrace.h"
+#include "support/VirtualSlot.h"
 
 #include <gnu/libc-version.h>
 #include <gtest/gtest.h>
@@ -93,6 +94,19 @@ TEST(Exception, ThrowsACopyOfItsDynamicClass) {
       EXPECT_EQ(thrown.GetBacktrace(), original->GetBacktrace());
     }
   }
+}
+
+// A destructor takes two places: it is there with and without giving the memory back (Itanium C++
+// ABI, 2.5.2).
+TEST(Throwable, KeepsItsOperationsInTheirOrder) {
+  using TestSupport::SlotOf;
+  EXPECT_TRUE(std::has_virtual_destructor<Throwable>::value);
+  EXPECT_EQ(SlotOf(&Throwable::what), 2);
+  EXPECT_EQ(SlotOf(&Throwable::GetBacktrace), 3);
+  EXPECT_EQ(SlotOf(&Throwable::Dump), 4);
+  EXPECT_EQ(SlotOf(&Throwable::Where), 5);
+  EXPECT_EQ(SlotOf(&Throwable::Clone), 6);
+  EXPECT_EQ(SlotOf(&Throwable::Throw), 7);
 }
 
 TEST(Exception, IsAStandardException) {

@@ -6,6 +6,7 @@
 #include "quorlin/Namespaces.h"
 #include "support/TokenFactory.h"
 #include "support/Verdict.h"
+#include "support/VirtualSlot.h"
 #include "support/XmlText.h"
 
 #include <quorlin/SamlToken.h>
@@ -80,6 +81,24 @@ TEST(SamlToken, NumbersItsConfirmationTypes) {
   EXPECT_EQ(static_cast<int>(SamlToken::CONFIRM_BEARER), 0);
   EXPECT_EQ(static_cast<int>(SamlToken::CONFIRM_HOLDER_OF_KEY), 1);
   EXPECT_FALSE(std::has_virtual_destructor<SamlToken>::value);
+}
+
+TEST(SamlToken, KeepsItsOperationsInTheirOrder) {
+  EXPECT_EQ(SlotOf(&SamlToken::GetId), 0);
+  EXPECT_EQ(SlotOf(&SamlToken::GetStartDate), 1);
+  EXPECT_EQ(SlotOf(&SamlToken::GetEndDate), 2);
+  EXPECT_EQ(SlotOf(&SamlToken::GetSubject), 3);
+  EXPECT_EQ(SlotOf(&SamlToken::IsRenewable), 4);
+  EXPECT_EQ(SlotOf(&SamlToken::IsDelegable), 5);
+  EXPECT_EQ(SlotOf(&SamlToken::IsSolution), 6);
+  EXPECT_EQ(SlotOf(&SamlToken::GetConfirmationMethod), 7);
+  EXPECT_EQ(SlotOf(&SamlToken::GetFullName), 8);
+  EXPECT_EQ(SlotOf(&SamlToken::GetGroups), 9);
+  EXPECT_EQ(SlotOf(&SamlToken::GetDelegationChain), 10);
+  EXPECT_EQ(SlotOf(&SamlToken::GetAudience), 11);
+  EXPECT_EQ(SlotOf(&SamlToken::GetAdvice), 12);
+  EXPECT_EQ(SlotOf(&SamlToken::GetConfirmationCertificate), 13);
+  EXPECT_EQ(SlotOf(&SamlToken::ToXml), 14);
 }
 
 // --- What a token says ---

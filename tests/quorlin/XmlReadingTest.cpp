@@ -5,6 +5,7 @@
 
 #include "quorlin/Namespaces.h"
 #include "support/Verdict.h"
+#include "support/VirtualSlot.h"
 #include "support/XmlText.h"
 
 #include <pelmar/Exception.h>
@@ -15,6 +16,7 @@
 #include <boost/make_shared.hpp>
 
 #include <string>
+#include <type_traits>
 #include <vector>
 
 namespace Quorlin {
@@ -134,6 +136,11 @@ TEST(IteratorToElement, GivesNullForOtherNodes) {
   EXPECT_EQ(IteratorToElement(parsed.It()), parsed.Root());
   EXPECT_EQ(IteratorToElement(parsed.It().GetChild()), nullptr);
   EXPECT_EQ(IteratorToElement(Iterate(nullptr)), nullptr);
+}
+
+TEST(NodeFilter, HasOneOperationAndNoVirtualDestructor) {
+  EXPECT_EQ(TestSupport::SlotOf(&NodeFilter::Accept), 0);
+  EXPECT_FALSE(std::has_virtual_destructor<NodeFilter>::value);
 }
 
 TEST(SkipWsAndCommentsFilter, RejectsAnEmptyText) {
@@ -491,8 +498,8 @@ TEST(GetULongOptionalAttribute, ReadsNumbersUpToTheLargestSigned64BitOne) {
 
 TEST(GetULongOptionalAttribute, RefusesAllElse) {
   for (const char* const text :
-       {"-1", "1.5", " 1", "1 ", "9223372036854775808", "-9223372036854775809", "", "+", "-", "+-1", "+-0", "-+1",
-        "++1", "0x1", "1e3", "1,000", "one", "99999999999999999999999"}) {
+       {"-1", "1.5", " 1", "1 ", "9223372036854775808", "-9223372036854775809", "", "+", "-", "+-1", "+-0",
+        "-+1", "++1", "0x1", "1e3", "1,000", "one", "99999999999999999999999"}) {
     EXPECT_EQ(NumberOf(std::string("Count='") + text + "'"),
               Refused("e/@Count is not a non-negative integer."))
         << text;
