@@ -33,6 +33,18 @@ TEST(Logging, AlwaysGivesTheSameLogger) {
   }
 }
 
+// Whoever asks for a logger first decides which levels it may ever write: here that is the library.
+TEST(Logging, MayWriteEveryLevel) {
+  const Service::Logger* const logger = getLogger();
+  Service::LogManager* const manager = Service::GetApp()->GetLogManager();
+  const int before = manager->GetEnabledLevels();
+  manager->SetEnabledLevels(127);
+  for (int level = 1; level <= 64; level *= 2) {
+    EXPECT_TRUE(logger->IsEnabled(level)) << level;
+  }
+  manager->SetEnabledLevels(before);
+}
+
 TEST(Logging, UsesTheLevelsOfOrdinaryLinesAndWarnings) {
   EXPECT_EQ(kLogLevelInfo, 64);
   EXPECT_EQ(kLogLevelWarning, 8);
