@@ -61,7 +61,7 @@ struct ElementRule {
   const char* required;  ///< Attributes; "*": they do not matter.
   const char* allowed;
   /// Names in order, each with ? * or +; or #text, #empty, #any. "#each" starts a list in any order, each at
-  /// most once; "#rest" stands for anything.
+  /// most once.
   const char* content;
 };
 
@@ -85,9 +85,9 @@ constexpr ElementRule kRules[] = {
     {"saml:AudienceRestriction", "*", "", "saml:Audience+"},
     {"saml:Audience", "*", "", "#text"},
     {"saml:ProxyRestriction", "", "Count", "#empty"},
-    {"saml:Condition[renew]", "xsi:type", "Count Postdatable RenewExpired", "#any"},
+    {"saml:Condition[renew]", "xsi:type", "Count Postdatable RenewExpired", "#empty"},
     {"saml:Condition[delegation]", "xsi:type", "", "del:Delegate+"},
-    {"del:Delegate", "DelegationInstant", "", "saml:NameID #rest"},
+    {"del:Delegate", "DelegationInstant", "", "saml:NameID"},
     {"saml:Advice", "", "", "ext:RSAAdvice+"},
     {"ext:RSAAdvice", "AdviceSource", "", "saml:Attribute+"},
     {"saml:AuthnStatement", "AuthnInstant", "", "saml:AuthnContext"},
@@ -266,9 +266,6 @@ inline bool FitEach(const Reading& element, const std::vector<std::string>& name
 inline bool FitSequence(const Reading& element, const std::vector<std::string>& names) {
   std::size_t at = 0;
   for (std::string name : names) {
-    if (name == "#rest") {
-      return true;
-    }
     const char last = name.back();
     const bool mayMiss = last == '?' || last == '*';
     const bool mayRepeat = last == '+' || last == '*';

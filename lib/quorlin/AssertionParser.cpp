@@ -293,6 +293,7 @@ void TryParseRenewRestriction(NodeFilterIterator& it, boost::optional<RenewRestr
   static const QNames kAllowed{LocalName("Count"), LocalName("Postdatable"), LocalName("RenewExpired")};
   RequireElementAttributesQNames(element, kRequired, kAllowed);
   GetULongOptionalAttribute(element, "Count", parsed.Count);
+  RequireEmptyElement(it);
   restriction = parsed;
   it.MoveToSibling();
 }
@@ -322,6 +323,7 @@ void ParseDelegate(NodeFilterIterator it, DelegateType& delegate) {
   it.MoveToChild();
   RequireElement(it, "NameID", kSaml);
   ParseNameIDType(it, delegate.NameID);
+  RequireEnd(it.MoveToSibling(), "Unexpected elements after NameID");
 }
 
 // --- Advice and statements ---

@@ -205,6 +205,10 @@ TEST(AssertionParser, RefusesFaultyRestrictions) {
           {"renew: bad count",
            Conditions("<saml:Condition xsi:type=\"ext:RenewRestrictionType\" Count=\"many\"/>"),
            "Condition/@Count is not a non-negative integer."},
+          {"renew: content",
+           Conditions(
+               "<saml:Condition xsi:type=\"ext:RenewRestrictionType\"><saml:Audience/></saml:Condition>"),
+           "Element 'Condition' must be empty"},
           {"delegation: count",
            Conditions("<saml:Condition xsi:type=\"del:DelegationRestrictionType\" Count=\"1\"/>"),
            "Unexpected attribute 'Count' on element 'Condition'"},
@@ -244,22 +248,27 @@ TEST(AssertionParser, RefusesFaultyDelegates) {
     ParseDelegate(it, delegate);
   };
   const std::string start = "<del:Delegate DelegationInstant=\"2020-01-01T00:00:00Z\"";
-  ExpectRefusals(read, {
-                           {"other element", "<del:NameID/>", "Expected element 'Delegate' not found."},
-                           {"namespace of the assertion", "<saml:Delegate/>",
-                            "Element 'Delegate' has unexpected namespace"},
-                           {"no instant", "<del:Delegate/>",
-                            "Node 'Delegate is missing required attribute 'DelegationInstant'"},
-                           {"ConfirmationMethod", start + " ConfirmationMethod=\"m\"/>",
-                            "Unexpected attributes on element 'Delegate'"},
-                           {"no date", "<del:Delegate DelegationInstant=\"then\"/>",
-                            "Delegate/@DelegationInstant is not a date"},
-                           {"no name", start + "/>", "Expected element 'NameID' not found."},
-                           {"name of another namespace", start + "><del:NameID/></del:Delegate>",
-                            "Element 'NameID' has unexpected namespace"},
-                           {"faulty name", start + "><saml:NameID/></del:Delegate>",
-                            "Node 'NameID is missing required attribute 'Format'"},
-                       });
+  ExpectRefusals(
+      read,
+      {
+          {"other element", "<del:NameID/>", "Expected element 'Delegate' not found."},
+          {"namespace of the assertion", "<saml:Delegate/>", "Element 'Delegate' has unexpected namespace"},
+          {"no instant", "<del:Delegate/>",
+           "Node 'Delegate is missing required attribute 'DelegationInstant'"},
+          {"ConfirmationMethod", start + " ConfirmationMethod=\"m\"/>",
+           "Unexpected attributes on element 'Delegate'"},
+          {"no date", "<del:Delegate DelegationInstant=\"then\"/>",
+           "Delegate/@DelegationInstant is not a date"},
+          {"no name", start + "/>", "Expected element 'NameID' not found."},
+          {"name of another namespace", start + "><del:NameID/></del:Delegate>",
+           "Element 'NameID' has unexpected namespace"},
+          {"faulty name", start + "><saml:NameID/></del:Delegate>",
+           "Node 'NameID is missing required attribute 'Format'"},
+          {"second name", start + ">" + NameIdElement("d1@e") + NameIdElement("d2@e") + "</del:Delegate>",
+           "Unexpected elements after NameID"},
+          {"text after the name", start + ">" + NameIdElement("d1@e") + "x</del:Delegate>",
+           "Unexpected elements after NameID"},
+      });
 }
 
 TEST(AssertionParser, RefusesOtherElementsAmongTheDelegates) {
