@@ -30,6 +30,7 @@
 #include <list>
 #include <memory>
 #include <mutex>
+#include <ostream>
 #include <string>
 #include <thread>
 #include <tuple>
@@ -190,6 +191,11 @@ struct FaultCase {
   bool isHarmless;
   bool hitsEachByte;  ///< In TLS too.
 };
+
+/// For gtest, which would print the bytes, those between the members too.
+void PrintTo(const FaultCase& fault, std::ostream* stream) {
+  *stream << fault.name;
+}
 
 class FaultSweep : public testing::TestWithParam<std::tuple<FaultCase, bool>> {};
 
