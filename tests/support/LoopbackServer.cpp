@@ -13,6 +13,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <csignal>
 #include <cstdint>
 #include <cstdio>
@@ -20,6 +21,7 @@
 #include <fstream>
 #include <sstream>
 #include <stdexcept>
+#include <thread>
 #include <utility>
 
 namespace TestSupport {
@@ -357,6 +359,11 @@ void LoopbackServer::Accept() {
   BlockSigpipe();
   for (;;) {
     const int socket = ::accept4(_listener, nullptr, nullptr, SOCK_CLOEXEC);
+    if (socket < 0 && errno == EMFILE) {
+      // A test may take all descriptors away for a while, and this thread may have come late.
+      std::this_thread::yield();
+      continue;
+    }
     const std::lock_guard<std::mutex> lock(_mutex);
     if (socket < 0 || _isStopping) {
       if (socket >= 0) {
