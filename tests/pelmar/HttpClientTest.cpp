@@ -9,10 +9,12 @@
 
 #include <pelmar/Exception.h>
 #include <pelmar/http/Client.h>
+#include <pelmar/http/ClientOptions.h>
 
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <future>
 #include <string>
 #include <vector>
 
@@ -439,27 +441,58 @@ TEST(HttpClient, SharesNoConnectionBetweenUserAgents) {
 }
 
 TEST(HttpClient, ConnectsAnewWhenTheServerHasClosed) {
-  LoopbackServer server({AnswerAndClose(kHello), AnswerAll(kHello)});
-  const Ref<UserAgent> agent = MakeAgent(server.GetPort());
-  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "one")));
-  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "two")));
-  EXPECT_EQ(2U, server.CountConnections());
-}
-
-TEST(HttpClient, ConnectsAnewWhenTheServerClosesUponTheNextRequest) {
-  LoopbackServer server({[](ServerConnection& connection) {
+  std::promise<void> isClosed;
+  LoopbackServer server({[&](ServerConnection& connection) {
                            connection.ReadRequest();
                            connection.Send(kHello);
-                           connection.ReadSome();
-                           connection.Reset();
+                           connection.EndSending();
+                           isClosed.set_value();
+                           connection.AwaitPeerEnd();
                          },
                          AnswerAll(kHello)});
   const Ref<UserAgent> agent = MakeAgent(server.GetPort());
   EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "one")));
+  isClosed.get_future().wait();
   EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "two")));
-  EXPECT_EQ("POST / HTTP/1.1\r\nHost: " + server.GetEndpoint() +
-                "\r\nAccept-Encoding: identity\r\nContent-Length: 3\r\n\r\ntwo",
+  EXPECT_EQ(2U, server.CountConnections());
+}
+
+/// Answers the first request, and breaks the connection off when it has read the next one.
+LoopbackServer::Script AnswerOnceAndReset() {
+  return [](ServerConnection& connection) {
+    connection.ReadRequest();
+    connection.Send(kHello);
+    connection.ReadRequest();
+    connection.Reset();
+  };
+}
+
+TEST(HttpClient, SendsAGetAgainWhenAKeptConnectionBreaks) {
+  LoopbackServer server({AnswerOnceAndReset(), AnswerAll(kHello)});
+  const Ref<UserAgent> agent = MakeAgent(server.GetPort());
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "one")));
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakeGet("/two")));
+  EXPECT_EQ("GET /two HTTP/1.1\r\nHost: " + server.GetEndpoint() + "\r\nAccept-Encoding: identity\r\n\r\n",
             server.GetRecord(1).received);
+}
+
+/// RFC 9110, section 9.2.2: the server may have done already what it was asked for.
+TEST(HttpClient, SendsNoPostAgainThatMayHaveBeenRead) {
+  LoopbackServer server({AnswerOnceAndReset(), AnswerAll(kHello)});
+  const Ref<UserAgent> agent = MakeAgent(server.GetPort());
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "one")));
+  const std::string endpoint = server.GetEndpoint();
+  Ref<PendingRequestItem> item;
+  agent->SendAsync(
+      MakePost("/", "two"), [](const Pelmar::Exception*, ClientResponse*, PendingRequestItem*) {}, item);
+  EXPECT_EQ("HttpException: " + endpoint + " closed the connection before it answered", Await(*agent, item));
+  EXPECT_FALSE(IsSafeToRetry(item));
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "three")));
+  std::string received;
+  for (std::size_t i = 0; i < server.CountConnections(); ++i) {
+    received += server.GetRecord(i).received;
+  }
+  EXPECT_EQ(received.find("two"), received.rfind("two"));
 }
 
 TEST(HttpClient, ClosesItsConnectionsWhenReleased) {

@@ -22,6 +22,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
+#include <future>
 #include <iterator>
 #include <string>
 #include <vector>
@@ -644,19 +645,38 @@ TEST_P(HttpTlsSession, IsKeptAliveWithinAUserAgent) {
   EXPECT_EQ(1U, server.CountConnections());
 }
 
-TEST_P(HttpTlsSession, IsReplacedWhenTheServerDropsTheConnection) {
+// The close_notify is still unread when the next request is sent.
+TEST_P(HttpTlsSession, IsReplacedWhenTheServerHasClosed) {
+  std::promise<void> isClosed;
+  LoopbackServer server(MakeSettings(), {[&](ServerConnection& connection) {
+                                           connection.ReadRequest();
+                                           connection.Send(kHello);
+                                           connection.EndSending();
+                                           isClosed.set_value();
+                                           connection.AwaitPeerEnd();
+                                         },
+                                         AnswerAll});
+  const Ref<UserAgent> agent = MakeAgent(MakeSpec(server, MakeContext(GetCa())));
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "leg")));
+  isClosed.get_future().wait();
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "leg")));
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "leg")));
+  EXPECT_EQ(2U, server.CountConnections());
+}
+
+TEST_P(HttpTlsSession, IsNotReplacedForAPostThatMayHaveBeenRead) {
   LoopbackServer server(MakeSettings(), {[](ServerConnection& connection) {
                                            connection.ReadRequest();
                                            connection.Send(kHello);
-                                           connection.ReadSome();
+                                           connection.ReadRequest();
                                            connection.CloseWithoutNotice();
                                          },
                                          AnswerAll});
   const Ref<UserAgent> agent = MakeAgent(MakeSpec(server, MakeContext(GetCa())));
-  for (int i = 0; i < 3; ++i) {
-    EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "leg")));
-  }
-  EXPECT_EQ(2U, server.CountConnections());
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakePost("/", "leg")));
+  EXPECT_EQ("HttpException: " + server.GetEndpoint() + " closed the connection before it answered",
+            Call(*agent, MakePost("/", "leg")));
+  EXPECT_EQ("200 OK|hello", Call(*agent, MakeGet("/")));
 }
 
 TEST_P(HttpTlsSession, OfTwoHundredUserAgentsAtOnce) {

@@ -284,6 +284,20 @@ void ServerConnection::Close() {
   CloseWithoutNotice();
 }
 
+void ServerConnection::EndSending() {
+  if (_tls) {
+    SSL_shutdown(_tls.get());
+  }
+  ::shutdown(_socket, SHUT_WR);
+  // The acknowledgement of our end is on its way; nothing else tells of it.
+  tcp_info info = {};
+  do {
+    std::this_thread::yield();
+    socklen_t size = sizeof info;
+    Require(::getsockopt(_socket, IPPROTO_TCP, TCP_INFO, &info, &size) == 0, "no state");
+  } while (info.tcpi_state == TCP_FIN_WAIT1);
+}
+
 void ServerConnection::CloseWithoutNotice() {
   ::shutdown(_socket, SHUT_WR);
   char buffer[kReadSize];

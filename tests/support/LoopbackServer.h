@@ -64,7 +64,9 @@ class ServerConnection final {
   void AwaitPeerEnd();
   /// Ends the connection the proper way (with TLS: close_notify), and reads what the peer still sends.
   void Close();
-  /// The same without TLS's close_notify.
+  /// Ends its own direction the proper way, and comes back when the peer's system knows.
+  void EndSending();
+  /// The same as `Close` without TLS's close_notify.
   void CloseWithoutNotice();
   /// Ends it with a TCP reset.
   void Reset();

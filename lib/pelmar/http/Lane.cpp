@@ -39,7 +39,7 @@ Lane::~Lane() {
 }
 
 void Lane::Start(const Ref<Exchange>& exchange, const SharedState& shared) {
-  auto transfer = std::make_unique<Transfer>(exchange, shared);
+  auto transfer = std::make_unique<Transfer>(exchange, shared, _sockets);
   CURL* const easy = transfer->GetHandle();
   const auto place = _transfers.emplace(easy, std::move(transfer)).first;
   const CURLMcode code = curl_multi_add_handle(_multi.get(), easy);

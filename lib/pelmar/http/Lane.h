@@ -8,6 +8,7 @@
 
 #include "pelmar/http/CurlHandles.h"
 #include "pelmar/http/Exchange.h"
+#include "pelmar/http/OpenSockets.h"
 #include "pelmar/http/Poller.h"
 #include "pelmar/http/Transfer.h"
 
@@ -63,7 +64,8 @@ class Lane final {
   Poller& _poller;
   SocketOwners& _owners;
   std::optional<Clock::time_point> _deadline;
-  MultiHandle _multi;
+  OpenSockets _sockets;
+  MultiHandle _multi;  // Closes the sockets when it goes.
   std::map<CURL*, std::unique_ptr<Transfer>> _transfers;
 };
 

@@ -61,8 +61,8 @@ bool HasHeader(const RequestParts& request, const std::string& lowerName) {
 
 }  // namespace
 
-Transfer::Transfer(const Ref<Exchange>& exchange, const SharedState& shared)
-    : _exchange(exchange), _shared(shared), _easy(curl_easy_init()) {
+Transfer::Transfer(const Ref<Exchange>& exchange, const SharedState& shared, OpenSockets& sockets)
+    : _exchange(exchange), _shared(shared), _sockets(sockets), _easy(curl_easy_init()) {
   if (!_easy) {
     throw HttpException("The HTTP engine cannot be set up");
   }
@@ -78,6 +78,7 @@ Transfer::Transfer(const Ref<Exchange>& exchange, const SharedState& shared)
     SetTls();
   }
   SetReceivers();
+  SetSockets();
   SetCookies();
 }
 
@@ -209,6 +210,13 @@ void Transfer::SetReceivers() {
   Set(CURLOPT_MAXFILESIZE_LARGE, static_cast<curl_off_t>(kMaxResponseBytes));
 }
 
+void Transfer::SetSockets() {
+  Set(CURLOPT_OPENSOCKETFUNCTION, &OpenSockets::OnOpen);
+  Set(CURLOPT_OPENSOCKETDATA, &_sockets);
+  Set(CURLOPT_CLOSESOCKETFUNCTION, &OpenSockets::OnClose);
+  Set(CURLOPT_CLOSESOCKETDATA, &_sockets);
+}
+
 void Transfer::SetCookies() {
   Set(CURLOPT_COOKIEFILE, "");  // Reads no file, but handles cookies.
   _cookiesBefore = _exchange->GetAgent().cookies->GetLines();
@@ -262,8 +270,17 @@ CURLcode Transfer::OnTlsContext(CURL*, void* tls, void* transfer) noexcept {
   return CURLE_SSL_CERTPROBLEM;
 }
 
-int Transfer::OnReady(void* transfer, char*, char*, int, int) noexcept {
-  static_cast<Transfer*>(transfer)->_wasReady = true;
+// Called again when the engine has replaced a kept connection that broke before any byte of an answer had
+// come. What the server may have read is not to be sent twice unless it is idempotent (RFC 9110,
+// section 9.2.2); a connection that the server had ended before is one over which it reads nothing (RFC 9112,
+// section 9.6).
+int Transfer::OnReady(void* transfer, char*, char*, int, int localPort) noexcept {
+  auto* const self = static_cast<Transfer*>(transfer);
+  if (self->_mayHaveBeenRead && self->_exchange->GetRequest().method == METHOD_POST) {
+    return CURL_PREREQFUNC_ABORT;
+  }
+  self->_wasReady = true;
+  self->_mayHaveBeenRead = !self->_sockets.HasPeerEnded(localPort);
   return CURL_PREREQFUNC_OK;
 }
 

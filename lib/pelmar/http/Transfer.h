@@ -8,6 +8,7 @@
 
 #include "pelmar/http/CurlHandles.h"
 #include "pelmar/http/Exchange.h"
+#include "pelmar/http/OpenSockets.h"
 #include "pelmar/http/ResponseHead.h"
 #include "pelmar/http/SpecShare.h"
 #include "pelmar/http/TlsRecord.h"
@@ -24,9 +25,9 @@ namespace Http {
 /// Lives on the HTTP loop's thread.
 class Transfer final {
  public:
-  /// `shared` has the TLS sessions and addresses of the spec. Throws HttpException when the engine refuses a
-  /// setting.
-  Transfer(const Ref<Exchange>& exchange, const SharedState& shared);
+  /// `shared` has the TLS sessions and addresses of the spec, `sockets` those of the user agent. Throws
+  /// HttpException when the engine refuses a setting.
+  Transfer(const Ref<Exchange>& exchange, const SharedState& shared, OpenSockets& sockets);
   Transfer(const Transfer&) = delete;
   Transfer& operator=(const Transfer&) = delete;
   ~Transfer() = default;
@@ -47,12 +48,13 @@ class Transfer final {
   void SetHeaders();
   void SetTls();
   void SetReceivers();
+  void SetSockets();
   void SetCookies();
 
   static std::size_t OnHeader(char* data, std::size_t size, std::size_t count, void* transfer) noexcept;
   static std::size_t OnBody(char* data, std::size_t size, std::size_t count, void* transfer) noexcept;
   static CURLcode OnTlsContext(CURL* easy, void* tls, void* transfer) noexcept;
-  static int OnReady(void* transfer, char*, char*, int, int) noexcept;
+  static int OnReady(void* transfer, char*, char*, int, int localPort) noexcept;
 
   void NoteTlsSetupFault(const char* text) noexcept;
   void NoteConnection();
@@ -63,6 +65,7 @@ class Transfer final {
 
   const Ref<Exchange> _exchange;
   const SharedState _shared;
+  OpenSockets& _sockets;
   char _engineText[CURL_ERROR_SIZE] = "";
   TextList _headers;
   TextList _proxyHeaders;
@@ -71,7 +74,8 @@ class Transfer final {
   ResponseHead _head;
   std::string _body;
   bool _isBodyTooLarge = false;
-  bool _wasReady = false;  // A connection stood, and the request was about to be sent.
+  bool _wasReady = false;         // A connection stood, and the request was about to be sent.
+  bool _mayHaveBeenRead = false;  // The peer had not ended that connection by then.
   bool _hasTlsStarted = false;
   bool _lacksMemory = false;  // For what has come.
   std::shared_ptr<TlsRecord> _tls;

@@ -259,6 +259,7 @@ std::string Describe(const TransferFacts& facts) {
                                      : "A header of the answer of " + facts.endpoint + " is too long";
     case CURLE_GOT_NOTHING:
     case CURLE_PARTIAL_FILE:
+    case CURLE_ABORTED_BY_CALLBACK:  // By ours that lets nothing be sent twice.
       return DescribeEnd(facts, "closed the connection");
     case CURLE_SEND_ERROR:
     case CURLE_RECV_ERROR:

@@ -119,9 +119,10 @@ typedef boost::function<void(const Exception*, ClientResponse*, PendingRequestIt
 /// the one that ClientOptions name. May be released while requests are pending: they go on, and their
 /// functors are called. Any number of requests may be pending, and any thread may send and wait.
 ///
-/// A kept connection that the server has closed is replaced, and the request sent again, if no byte of an
-/// answer had come. When the process exits, pending requests end with an HttpException; functors that have
-/// not been called by then are dropped.
+/// A kept connection that breaks before any byte of an answer has come is replaced, and the request sent
+/// again, if it is a GET or the server had ended the connection before the request was sent. A POST that the
+/// server may have read is not sent twice (RFC 9110, section 9.2.2). When the process exits, pending requests
+/// end with an HttpException; functors that have not been called by then are dropped.
 class PELMAR_API UserAgent : public Object {
  public:
   /// Starts the exchange and returns. `completion` is called once, on a platform thread, perhaps before this
