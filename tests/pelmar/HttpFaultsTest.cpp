@@ -152,6 +152,14 @@ TEST(HttpFaults, RefusesWhatIsNotHttp1) {
   }
 }
 
+/// The other protocol may have nothing to say for as long as we wait.
+TEST(HttpFaults, RefusesASwitchToAnotherProtocolAtOnce) {
+  EXPECT_EQ(
+      "HttpException: PEER did not answer in HTTP/1",
+      CallOnce(SendAndStaySilent("HTTP/1.1 101 Switching Protocols\r\nUpgrade: h2c\r\n\r\nHTTP/1.1 200 OK\r\n"
+                                 "Content-Length: 5\r\n\r\nhello")));
+}
+
 TEST(HttpFaults, RefusesBrokenChunks) {
   const std::string head = "HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n";
   const std::string refusal = "HttpException: PEER answered in broken chunks";

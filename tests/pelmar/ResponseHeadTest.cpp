@@ -63,7 +63,7 @@ TEST(ResponseHead, RefusesOtherVersionsAndBadCodes) {
        {"HTTP/2 200 OK\r\n", "HTTP/2.0 200 OK\r\n", "HTTP/0.9 200 OK\r\n", "HTTP/1.1\r\n", "HTTP/1.1 20\r\n",
         "HTTP/1.1 2x0 OK\r\n", "HTTP/1.1  200 OK\r\n", "HTTP/\r\n", "HTTP/1.x 200 OK\r\n",
         "HTTP/1.1x200 OK\r\n", "HTTP/1.1 2000 OK\r\n", "HTTP/1.1 200OK\r\n", "HTTP/1.1 099 OK\r\n",
-        "http/1.1 200 OK\r\n", "X: a\r\n", "\r\n"}) {
+        "http/1.1 200 OK\r\n", "X: a\r\n", "\r\n", "HTTP/1.1 101 Switching Protocols\r\n"}) {
     EXPECT_EQ(HeadFault::NOT_HTTP_1, Judge({line})) << line;
   }
 }

@@ -17,6 +17,7 @@ namespace {
 constexpr std::size_t kMinorVersionOffset = 7;
 constexpr std::size_t kStatusCodeOffset = 9;  // After "HTTP/1.x ".
 constexpr std::size_t kStatusCodeDigits = 3;
+constexpr int kSwitchingProtocols = 101;
 constexpr int kNoContent = 204;
 
 bool IsDigit(char c) {
@@ -115,7 +116,8 @@ HeadFault ResponseHead::TakeStatusLine(const std::string& line) {
   _isHttp10 = line[kMinorVersionOffset] == '0';
   _statusCode = std::stoi(line.substr(kStatusCodeOffset, kStatusCodeDigits));
   _reason = MaskControlCharacters(TrimBlanks(line.substr(kStatusCodeOffset + kStatusCodeDigits)));
-  return HeadFault::NONE;
+  // What follows would be in the other protocol, which no request asks for (RFC 9110, section 7.8).
+  return _statusCode == kSwitchingProtocols ? HeadFault::NOT_HTTP_1 : HeadFault::NONE;
 }
 
 HeadFault ResponseHead::TakeEnd() {

@@ -15,7 +15,7 @@ namespace Http {
 enum class HeadFault {
   NONE,
   TOO_LARGE,        ///< More than kMaxResponseHeaderBytes, interim responses and trailers included.
-  NOT_HTTP_1,       ///< A status line of another protocol or version.
+  NOT_HTTP_1,       ///< A status line of another protocol or version, or a switch to one (101).
   CONTENT_CODING,   ///< A Content-Encoding, though the request asked for none.
   TRANSFER_CODING,  ///< A Transfer-Encoding other than chunked, once, in HTTP/1.1.
   BAD_FIELD,        ///< A header line that is no name, colon and value, or that continues the one before.

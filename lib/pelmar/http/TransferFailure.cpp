@@ -229,9 +229,7 @@ std::string Describe(const TransferFacts& facts) {
   switch (facts.code) {
     case CURLE_OK:
       // The engine takes the end of the connection inside the headers for the end of the answer.
-      return facts.head.HasStarted() && facts.head.GetStatusCode() == 101
-                 ? facts.endpoint + " did not answer in HTTP/1"
-                 : DescribeEnd(facts, "closed the connection");
+      return DescribeEnd(facts, "closed the connection");
     case CURLE_COULDNT_RESOLVE_HOST:
       return "Host " + facts.host + " was not found";
     case CURLE_COULDNT_RESOLVE_PROXY:
