@@ -6,7 +6,7 @@
 #ifndef PELMAR_CRYPTO_CERTIFICATEIMPL_H
 #define PELMAR_CRYPTO_CERTIFICATEIMPL_H
 
-#include "pelmar/crypto/VerificationContexts.h"
+#include "pelmar/crypto/KeyContexts.h"
 
 #include <pelmar/crypto/Certificate.h>
 
@@ -47,7 +47,7 @@ class CertificateImpl final : public Certificate {
   /// The subject's public key, owned by this object; null when OpenSSL does not know such keys.
   evp_pkey_st* GetPublicKey() const noexcept;
   /// Of the public key; the certificate stays the same whatever is taken or given.
-  VerificationContexts& GetVerificationContexts() const noexcept { return _verificationContexts; }
+  KeyContexts& GetVerificationContexts() const noexcept { return _verificationContexts; }
 
  private:
   struct X509Deleter {
@@ -62,7 +62,7 @@ class CertificateImpl final : public Certificate {
   std::vector<unsigned char> _sha256;
   System::DateTime _notBefore;
   System::DateTime _notAfter;
-  mutable VerificationContexts _verificationContexts;
+  mutable KeyContexts _verificationContexts;
 };
 
 /// `certificate` as the platform's own class; a foreign implementation is read again from its DER. Throws

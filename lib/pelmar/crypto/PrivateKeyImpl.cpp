@@ -3,38 +3,17 @@
 
 #include "pelmar/crypto/PrivateKeyImpl.h"
 
-#include "pelmar/crypto/DigestWriter.h"
 #include "pelmar/crypto/EcdsaValue.h"
 #include "pelmar/crypto/KeyStrength.h"
 #include "pelmar/crypto/OpenSslError.h"
 #include "pelmar/crypto/OpenSslHandles.h"
 
+#include <pelmar/crypto/Digest.h>
+
+#include <utility>
+
 namespace Pelmar {
 namespace Crypto {
-
-namespace {
-
-std::vector<unsigned char> MakeSignature(EVP_PKEY* key, DigestAlgorithm digest, const void* data,
-                                         std::size_t size) {
-  const DigestContextHandle context(EVP_MD_CTX_new());
-  if (!context ||
-      EVP_DigestSignInit(context.get(), nullptr, GetDigestImplementation(digest), nullptr, key) != 1) {
-    ThrowOpenSslError("Signing cannot be started");
-  }
-  const auto* const bytes = static_cast<const unsigned char*>(data);
-  std::size_t length = 0;
-  if (EVP_DigestSign(context.get(), nullptr, &length, bytes, size) != 1) {
-    ThrowOpenSslError("Signing failed");
-  }
-  std::vector<unsigned char> value(length);
-  if (EVP_DigestSign(context.get(), value.data(), &length, bytes, size) != 1) {
-    ThrowOpenSslError("Signing failed");
-  }
-  value.resize(length);
-  return value;
-}
-
-}  // namespace
 
 PrivateKey::PrivateKey() = default;
 
@@ -52,8 +31,27 @@ PrivateKeyImpl::~PrivateKeyImpl() = default;
 std::vector<unsigned char> PrivateKeyImpl::Sign(DigestAlgorithm digest, const void* data,
                                                 std::size_t size) const {
   ClearOpenSslErrors();
-  const std::vector<unsigned char> value = MakeSignature(_key.get(), digest, data, size);
+  const std::vector<unsigned char> value = MakeValue(digest, ComputeDigest(digest, data, size));
   return _type == KEY_EC ? EcdsaValueFromDer(value, GetEcOrderBytes(_key.get())) : value;
+}
+
+std::vector<unsigned char> PrivateKeyImpl::MakeValue(DigestAlgorithm algorithm,
+                                                     const std::vector<unsigned char>& digest) const {
+  KeyContextHandle context = _signingContexts.Take(algorithm);
+  if (!context) {
+    context = StartKeyContext(_key.get(), _type, algorithm, EVP_PKEY_sign_init);
+  }
+  if (!context) {
+    ThrowOpenSslError("Signing cannot be started");
+  }
+  std::vector<unsigned char> value(static_cast<std::size_t>(EVP_PKEY_get_size(_key.get())));
+  std::size_t length = value.size();
+  if (EVP_PKEY_sign(context.get(), value.data(), &length, digest.data(), digest.size()) != 1) {
+    ThrowOpenSslError("Signing failed");
+  }
+  _signingContexts.Give(algorithm, std::move(context));
+  value.resize(length);
+  return value;
 }
 
 }  // namespace Crypto

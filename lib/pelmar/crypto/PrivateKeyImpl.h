@@ -6,6 +6,8 @@
 #ifndef PELMAR_CRYPTO_PRIVATEKEYIMPL_H
 #define PELMAR_CRYPTO_PRIVATEKEYIMPL_H
 
+#include "pelmar/crypto/KeyContexts.h"
+
 #include <pelmar/crypto/PrivateKey.h>
 
 #include <cstddef>
@@ -37,8 +39,12 @@ class PrivateKeyImpl : public PrivateKey {
     void operator()(evp_pkey_st* key) const noexcept;
   };
 
+  std::vector<unsigned char> MakeValue(DigestAlgorithm algorithm,
+                                       const std::vector<unsigned char>& digest) const;
+
   std::unique_ptr<evp_pkey_st, KeyDeleter> _key;
   KeyType _type;
+  mutable KeyContexts _signingContexts;  // The key stays the same whatever is taken or given.
 };
 
 }  // namespace Crypto

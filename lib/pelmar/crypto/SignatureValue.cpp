@@ -4,13 +4,11 @@
 #include "pelmar/crypto/SignatureValue.h"
 
 #include "pelmar/crypto/CertificateImpl.h"
-#include "pelmar/crypto/DigestWriter.h"
 #include "pelmar/crypto/EcdsaValue.h"
+#include "pelmar/crypto/KeyContexts.h"
 #include "pelmar/crypto/KeyStrength.h"
 #include "pelmar/crypto/OpenSslError.h"
 #include "pelmar/crypto/OpenSslHandles.h"
-
-#include <openssl/rsa.h>
 
 #include <utility>
 
@@ -20,16 +18,6 @@ namespace Crypto {
 namespace {
 
 constexpr const char* kOwner = "The certificate";
-
-KeyContextHandle StartVerification(EVP_PKEY* key, KeyType type, DigestAlgorithm algorithm) {
-  KeyContextHandle context(EVP_PKEY_CTX_new(key, nullptr));
-  if (!context || EVP_PKEY_verify_init(context.get()) != 1 ||
-      (type == KEY_RSA && EVP_PKEY_CTX_set_rsa_padding(context.get(), RSA_PKCS1_PADDING) != 1) ||
-      EVP_PKEY_CTX_set_signature_md(context.get(), GetDigestImplementation(algorithm)) != 1) {
-    ThrowOpenSslError("Signature verification cannot be started");
-  }
-  return context;
-}
 
 bool IsSignature(EVP_PKEY_CTX* context, const std::vector<unsigned char>& digest,
                  const std::vector<unsigned char>& value) {
@@ -60,7 +48,10 @@ bool VerifySignatureValue(const Certificate* certificate, DigestAlgorithm algori
   }
   KeyContextHandle context = signer->GetVerificationContexts().Take(algorithm);
   if (!context) {
-    context = StartVerification(key, type, algorithm);
+    context = StartKeyContext(key, type, algorithm, EVP_PKEY_verify_init);
+  }
+  if (!context) {
+    ThrowOpenSslError("Signature verification cannot be started");
   }
   const bool holds = IsSignature(context.get(), digest, type == KEY_EC ? EcdsaValueToDer(value) : value);
   signer->GetVerificationContexts().Give(algorithm, std::move(context));

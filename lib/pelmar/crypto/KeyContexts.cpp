@@ -1,12 +1,28 @@
 // SPDX-License-Identifier: Apache-2.0
 // Copyright the Quorlin authors
 
-#include "pelmar/crypto/VerificationContexts.h"
+#include "pelmar/crypto/KeyContexts.h"
+
+#include "pelmar/crypto/DigestWriter.h"
+
+#include <openssl/rsa.h>
+
+#include <utility>
 
 namespace Pelmar {
 namespace Crypto {
 
-VerificationContexts::~VerificationContexts() {
+KeyContextHandle StartKeyContext(EVP_PKEY* key, KeyType type, DigestAlgorithm algorithm,
+                                 int (*init)(EVP_PKEY_CTX*)) {
+  KeyContextHandle context(EVP_PKEY_CTX_new(key, nullptr));
+  const bool isReady =
+      context && init(context.get()) == 1 &&
+      (type != KEY_RSA || EVP_PKEY_CTX_set_rsa_padding(context.get(), RSA_PKCS1_PADDING) == 1) &&
+      EVP_PKEY_CTX_set_signature_md(context.get(), GetDigestImplementation(algorithm)) == 1;
+  return isReady ? std::move(context) : nullptr;
+}
+
+KeyContexts::~KeyContexts() {
   for (Places& places : _places) {
     for (std::atomic<EVP_PKEY_CTX*>& place : places) {
       EVP_PKEY_CTX_free(place.load(std::memory_order_acquire));
@@ -14,7 +30,7 @@ VerificationContexts::~VerificationContexts() {
   }
 }
 
-KeyContextHandle VerificationContexts::Take(DigestAlgorithm algorithm) noexcept {
+KeyContextHandle KeyContexts::Take(DigestAlgorithm algorithm) noexcept {
   for (std::atomic<EVP_PKEY_CTX*>& place : PlacesOf(algorithm)) {
     EVP_PKEY_CTX* const context = place.exchange(nullptr, std::memory_order_acquire);
     if (context != nullptr) {
@@ -24,7 +40,7 @@ KeyContextHandle VerificationContexts::Take(DigestAlgorithm algorithm) noexcept 
   return nullptr;
 }
 
-void VerificationContexts::Give(DigestAlgorithm algorithm, KeyContextHandle context) noexcept {
+void KeyContexts::Give(DigestAlgorithm algorithm, KeyContextHandle context) noexcept {
   for (std::atomic<EVP_PKEY_CTX*>& place : PlacesOf(algorithm)) {
     EVP_PKEY_CTX* nobody = nullptr;
     if (place.compare_exchange_strong(nobody, context.get(), std::memory_order_release,
@@ -35,7 +51,7 @@ void VerificationContexts::Give(DigestAlgorithm algorithm, KeyContextHandle cont
   }
 }
 
-VerificationContexts::Places& VerificationContexts::PlacesOf(DigestAlgorithm algorithm) noexcept {
+KeyContexts::Places& KeyContexts::PlacesOf(DigestAlgorithm algorithm) noexcept {
   static_assert(DIGEST_SHA256 == 0 && DIGEST_SHA512 == kAlgorithms - 1, "the algorithms are the indexes");
   return _places[static_cast<std::size_t>(algorithm)];
 }
