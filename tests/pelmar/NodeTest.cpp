@@ -5,6 +5,7 @@
 
 #include <pelmar/Exception.h>
 #include <pelmar/xml/Node.h>
+#include <pelmar/xml/Parser.h>
 
 #include <gtest/gtest.h>
 
@@ -294,6 +295,36 @@ TEST(ElementNode, RefusesBadNames) {
   }
   for (const char* const prefix : {"xmlns", "1", ":", "p:q", "p "}) {
     EXPECT_EQ(ArgumentMessage([&] { MakeElement(prefix, "a"); }), kMalformed) << prefix;
+  }
+}
+
+// Names that were made before are remembered; neither those nor what somebody feeds to the handler of
+// documents, which leaves names to the parser, may let a malformed one pass.
+TEST(ElementNode, RefusesBadNamesLikeGoodOnesBefore) {
+  const std::string kMalformed = "Invalid argument : malformed element name";
+  EXPECT_EQ(MakeElement("p", "a")->GetQualifiedName(), "p:a");
+  EXPECT_EQ(MakeElement("p", "a")->GetQualifiedName(), "p:a");
+  EXPECT_EQ(MakeElement("", "a")->GetQualifiedName(), "a");
+  EXPECT_EQ(ArgumentMessage([] { MakeElement("", "p:a"); }), kMalformed);
+  EXPECT_EQ(ArgumentMessage([] { MakeElement("p:a", ""); }), kMalformed);
+  const Ref<XMLHandler> handler = CreateXMLDocumentHandler();
+  handler->StartElement({{"a b", 3}, 0}, nullptr, 0, 1, 1);
+  EXPECT_EQ(ArgumentMessage([] { MakeElement("", "a b"); }), kMalformed);
+  EXPECT_EQ(ArgumentMessage([] { MakeElement("", "a b"); }), kMalformed);
+}
+
+// Whether or not they take each other's place in what is remembered.
+TEST(ElementNode, HasTheNameThatItWasGiven) {
+  for (int round = 0; round < 2; ++round) {
+    for (char first = 'a'; first <= 'z'; ++first) {
+      for (const char* const rest : {"", "a", "b", "aa", "ba"}) {
+        const std::string name = first + std::string(rest);
+        EXPECT_EQ(MakeElement("", name)->GetQualifiedName(), name);
+        EXPECT_EQ(MakeElement(name, name)->GetQualifiedName(), name + ":" + name);
+        const Ref<Document> parsed = ParseXmlText("<" + name + "/>");
+        EXPECT_EQ(parsed->GetDocumentElement()->GetQualifiedName(), name);
+      }
+    }
   }
 }
 

@@ -70,6 +70,10 @@ bool ArePlainAscii(const char* text) {
   return ((bytes | (bytes - kEach * 0x20)) & (kEach * 0x80)) == 0;
 }
 
+bool IsPlainAscii(char c) {
+  return c >= 0x20 && static_cast<unsigned char>(c) < 0x80;
+}
+
 // XML 1.0, production 2 (Char), for what is already a Unicode scalar value.
 bool IsXmlCharacter(char32_t c) {
   if (c < 0x20) {
@@ -102,6 +106,11 @@ bool IsXmlText(const std::string& text) {
   while (position < text.size()) {
     if (text.size() - position >= sizeof(std::uint64_t) && ArePlainAscii(text.data() + position)) {
       position += sizeof(std::uint64_t);
+      continue;
+    }
+    // Fewer than eight are left at the end of every text, and most texts are short.
+    if (IsPlainAscii(text[position])) {
+      ++position;
       continue;
     }
     char32_t character = 0;

@@ -5,43 +5,26 @@
 
 #include "pelmar/core/PerThread.h"
 #include "pelmar/xml/NameRules.h"
+#include "pelmar/xml/RememberedNames.h"
 
-#include <array>
 #include <cstdint>
 #include <string>
-#include <string_view>
 
 namespace Pelmar {
 namespace Xml {
 
 namespace {
 
-Ref<const ElementName> MakeName(const NameParts& parts) {
-  return MakeRef<const ElementName>(std::string(parts.prefix), std::string(parts.localName));
-}
-
-constexpr std::size_t kRememberedNames = 64;
-constexpr std::size_t kMaxBytesOfRememberedName = 64;
-
-using RememberedNames = std::array<Ref<const ElementName>, kRememberedNames>;
-
-// Names repeat, within a document and from one to the next. Each has one place where it may be remembered,
-// and whoever comes later to that place takes it over: a foreign document can have a hundred thousand names,
-// chosen so as to meet in any table that keeps them all.
-Ref<const ElementName> ShareName(const NameRange& name) {
-  const std::string_view text = ViewOf(name.text);
-  const NameParts parts = PartsOf(name);
+Ref<const ElementName> ShareName(const NameParts& parts) {
   RememberedNames* const names = PerThread<RememberedNames>::Get();
-  if (names == nullptr || text.size() > kMaxBytesOfRememberedName) {
-    return MakeName(parts);
+  Ref<const ElementName> name = names != nullptr ? names->Find(parts) : nullptr;
+  if (!name) {
+    name = MakeRef<const ElementName>(std::string(parts.prefix), std::string(parts.localName));
+    if (names != nullptr) {
+      names->Remember(name);
+    }
   }
-  const std::size_t mix = text.size() * 31 + static_cast<unsigned char>(text.back()) * 7 +
-                          static_cast<unsigned char>(text[text.size() / 2]);
-  Ref<const ElementName>& place = (*names)[mix % kRememberedNames];
-  if (!place || place->qualifiedName != text) {
-    place = MakeName(parts);
-  }
-  return place;
+  return name;
 }
 
 }  // namespace
@@ -50,7 +33,7 @@ DocumentBuilder::DocumentBuilder() : _document(new Document()), _current(_docume
 
 void DocumentBuilder::StartElement(const NameRange& name, const AttributeRange* attributes,
                                    std::size_t attributeCount, unsigned long line, unsigned long column) {
-  ElementNode* const element = new ElementNode(ShareName(name));
+  ElementNode* const element = new ElementNode(ShareName(PartsOf(name)));
   Append(element);
   element->_line = static_cast<std::uint32_t>(line);
   element->_column = static_cast<std::uint32_t>(column);

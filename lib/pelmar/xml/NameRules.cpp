@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <array>
 #include <cstddef>
+#include <string>
 
 namespace Pelmar {
 namespace Xml {
@@ -58,9 +59,9 @@ bool MayBeginName(std::string_view name) noexcept {
 }
 
 // The tables of the characters beyond ASCII are the tokeniser's; ours could only differ from them.
-bool IsNameToTheParser(const std::string& name) {
+bool IsNameToTheParser(std::string_view name) {
   const ExpatHandle parser = CreateExpat();
-  const std::string document = "<" + name + "/>";
+  const std::string document = "<" + std::string(name) + "/>";
   return XML_Parse(parser.get(), document.data(), static_cast<int>(document.size()), XML_TRUE) ==
          XML_STATUS_OK;
 }
@@ -128,7 +129,7 @@ const char* FindDeclarationFault(std::string_view prefix, std::string_view uri) 
   return nullptr;
 }
 
-bool IsNcName(const std::string& name) {
+bool IsNcName(std::string_view name) {
   constexpr std::size_t kMaxNameBytes = 65536;
   if (name.empty() || name.size() > kMaxNameBytes || !MayBeginName(name) ||
       !ConsistsOf(name, [](char c) { return MayContinueName(c); })) {

@@ -8,7 +8,6 @@
 
 #include <pelmar/xml/Parser.h>
 
-#include <string>
 #include <string_view>
 
 namespace Pelmar {
@@ -54,7 +53,7 @@ bool IsQualifiedName(const NameRange& name) noexcept;
 const char* FindDeclarationFault(std::string_view prefix, std::string_view uri) noexcept;
 
 /// Whether `name` is a Name of XML 1.0 without a colon, as the parser would accept it.
-bool IsNcName(const std::string& name);
+bool IsNcName(std::string_view name);
 
 }  // namespace Xml
 }  // namespace Pelmar

@@ -3,7 +3,9 @@
 
 #include <pelmar/xml/Node.h>
 
+#include "pelmar/core/PerThread.h"
 #include "pelmar/xml/NameRules.h"
+#include "pelmar/xml/RememberedNames.h"
 #include "pelmar/xml/XmlTextWriter.h"
 
 #include <pelmar/Exception.h>
@@ -142,13 +144,13 @@ void ParentNode::Unlink(Node* child) noexcept {
 
 // ---- ElementNode
 
-ElementNode::ElementNode(const Ref<const ElementName>& name)
+ElementNode::ElementNode(Ref<const ElementName> name)
     : ParentNode(ELEMENT_NODE),
       _line(0),
       _column(0),
       _writtenWithEndTag(false),
       _declaresNamespaces(false),
-      _name(name) {}
+      _name(std::move(name)) {}
 
 ElementNode::~ElementNode() = default;
 
@@ -160,14 +162,25 @@ std::set<std::string> ElementNode::GetAttributeNames() const {
   return names;
 }
 
-bool ElementNode::GetAttribute(const std::string& name, std::string& value) const {
-  for (const Attribute& attribute : _attributes) {
+namespace {
+
+const std::string* FindValue(const AttributeList& attributes, const std::string& name) noexcept {
+  for (const Attribute& attribute : attributes) {
     if (attribute.name == name) {
-      value = attribute.value;
-      return true;
+      return &attribute.value;
     }
   }
-  return false;
+  return nullptr;
+}
+
+}  // namespace
+
+bool ElementNode::GetAttribute(const std::string& name, std::string& value) const {
+  const std::string* const found = FindValue(_attributes, name);
+  if (found != nullptr) {
+    value = *found;
+  }
+  return found != nullptr;
 }
 
 bool ElementNode::GetAttribute(const QName& name, std::string& value) const {
@@ -225,9 +238,9 @@ const std::string* ElementNode::FindNamespaceUri(const std::string& prefix) cons
 
 namespace {
 
-bool IsAttributeName(const std::string& name) {
+bool IsAttributeName(std::string_view name) {
   const std::size_t colon = name.find(':');
-  if (colon == std::string::npos) {
+  if (colon == std::string_view::npos) {
     return IsNcName(name);
   }
   return IsNcName(name.substr(0, colon)) && IsNcName(name.substr(colon + 1));
@@ -252,14 +265,14 @@ void RequireAttribute(const std::string& name, const std::string& value) {
 
 void ElementNode::DefineAttribute(const std::string& name, const std::string& value) {
   RequireAttribute(name, value);
-  std::string present;
-  if (!GetAttribute(name, present)) {
+  const std::string* const present = FindValue(_attributes, name);
+  if (present == nullptr) {
     std::string_view prefix;
     _attributes.push_back(Attribute{name, value});
     _declaresNamespaces = _declaresNamespaces || IsNamespaceDeclaration(name, prefix);
     return;
   }
-  if (present != value) {
+  if (*present != value) {
     throw InvalidArgumentException("attribute '" + name + "' is already defined with another value");
   }
 }
@@ -341,11 +354,34 @@ ElementNode* Document::GetDocumentElement() const noexcept {
 
 // ---- Creation and views
 
-void CreateElementNode(const std::string& prefix, const std::string& localName, Ref<ElementNode>& result) {
+namespace {
+
+// Apart from those of the parser, which anybody can feed with names that nobody has checked.
+struct CreatedNames {
+  RememberedNames names;
+};
+
+Ref<const ElementName> MakeName(const std::string& prefix, const std::string& localName) {
   if (!IsNcName(localName) || !(prefix.empty() || IsNcName(prefix)) || prefix == "xmlns") {
     throw InvalidArgumentException("malformed element name");
   }
-  result = Ref<ElementNode>(new ElementNode(MakeRef<const ElementName>(prefix, localName)));
+  return MakeRef<const ElementName>(prefix, localName);
+}
+
+}  // namespace
+
+// A name that was checked once, and is remembered, is not checked again: the elements of a request have the
+// same names each time.
+void CreateElementNode(const std::string& prefix, const std::string& localName, Ref<ElementNode>& result) {
+  CreatedNames* const created = PerThread<CreatedNames>::Get();
+  Ref<const ElementName> name = created != nullptr ? created->names.Find({prefix, localName}) : nullptr;
+  if (!name) {
+    name = MakeName(prefix, localName);
+    if (created != nullptr) {
+      created->names.Remember(name);
+    }
+  }
+  result = Ref<ElementNode>(new ElementNode(std::move(name)));
 }
 
 void CreateTextNode(Ref<TextNode>& result) {

@@ -177,7 +177,7 @@ class PELMAR_API ElementNode final : public ParentNode {
                                            Ref<ElementNode>& result);
   friend class XmlTextWriter;
 
-  explicit ElementNode(const Ref<const ElementName>& name);
+  explicit ElementNode(Ref<const ElementName> name);
   ~ElementNode() override;
 
   // No text that is parsed has more lines, or columns, than these can count.
