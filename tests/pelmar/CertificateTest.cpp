@@ -138,6 +138,8 @@ TEST(Certificate, RefusesEveryTruncation) {
 TEST(Certificate, RefusesWhatIsTooLarge) {
   EXPECT_EQ(RefusalOfDer(std::vector<unsigned char>(kMaxCertificateBytes + 1)),
             "The certificate is larger than 65536 bytes");
+  EXPECT_EQ(RefusalOfDer(std::vector<unsigned char>(kMaxCertificateBytes)),
+            "The certificate cannot be read: wrong tag");
 }
 
 TEST(Certificate, RefusesAPemTextThatIsTooLarge) {

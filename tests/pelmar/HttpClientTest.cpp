@@ -197,6 +197,8 @@ TEST(HttpClient, RefusesBadConnectionSpecs) {
             CatchArgumentRefusal([] { CreateTCPConnectionSpec("a", 0); }));
   EXPECT_EQ("Invalid argument : the port is not from 1 to 65535",
             CatchArgumentRefusal([] { CreateTCPConnectionSpec("a", 65536); }));
+  EXPECT_NO_THROW(CreateTCPConnectionSpec("a", 1));
+  EXPECT_NO_THROW(CreateTCPConnectionSpec("a", 65535));
 }
 
 TEST(HttpClient, RefusesCookieFiles) {

@@ -151,6 +151,30 @@ TEST(HttpTls, TellsAFewOfManyNames) {
             CallIdentity(MakeIssued(GetCa(), spec)));
 }
 
+TEST(HttpTls, TellsTheNamesOfHostsAndAddressesOnly) {
+  CertificateSpec spec = ServerSpec();
+  spec.subjectAlternativeName = "email:sts@other.test,DNS:other.test,URI:http://sts.test/,IP:::1";
+  EXPECT_EQ("HttpException: Certificate of sts.test does not match the name: it is for other.test, ::1",
+            CallIdentity(MakeIssued(GetCa(), spec)));
+  // An address of three bytes.
+  spec.subjectAlternativeName = "DER:30:05:87:03:7F:00:01";
+  EXPECT_EQ("HttpException: Certificate of sts.test does not match the name: it is for ?",
+            CallIdentity(MakeIssued(GetCa(), spec)));
+}
+
+// Otherwise our own certificate would be shown to it, and it could believe that we trust it.
+TEST(HttpTls, BreaksTheHandshakeWithARefusedServerOff) {
+  CertificateSpec otherName = ServerSpec();
+  otherName.subjectAlternativeName = "DNS:other.test";
+  for (const Identity& identity :
+       {MakeIssued(MakeCa("Strange CA", 2), ServerSpec()), MakeIssued(GetCa(), otherName)}) {
+    LoopbackServer server(TlsServerSettings(identity), {AnswerAndClose});
+    Call(*MakeAgent(MakeSpec(server, MakeContext(GetCa()))), MakeGet("/"));
+    server.AwaitEnd(0);
+    EXPECT_FALSE(server.GetRecord(0).isSecured);
+  }
+}
+
 TEST(HttpTls, RefusesUnknownIssuers) {
   const Identity stranger = MakeCa("Strange CA", 2);
   EXPECT_EQ("HttpException: Certificate of sts.test is not trusted: issuer CN=Strange CA",
@@ -257,10 +281,11 @@ TEST(HttpTls, KeepsTheAnchorsOfContextsApart) {
   EXPECT_EQ(refusal, Call(*MakeAgent(MakeSpec(server, wrong)), MakeGet("/")));
 }
 
-TEST(HttpTls, AsksForTheServerByName) {
+TEST(HttpTls, AsksForTheServerByNameAndForHttp11) {
   LoopbackServer server(TlsServerSettings(GetServerIdentity()), {AnswerAndClose});
   EXPECT_EQ("200 OK|hello", Call(*MakeAgent(MakeSpec(server, MakeContext(GetCa()))), MakeGet("/path")));
   EXPECT_EQ("sts.test", server.GetRecord(0).serverNameAsked);
+  EXPECT_EQ("\x08http/1.1", server.GetRecord(0).protocolsAsked);
   EXPECT_EQ("GET /path HTTP/1.1\r\nHost: sts.test:" + std::to_string(server.GetPort()) +
                 "\r\nAccept-Encoding: identity\r\n\r\n",
             server.GetRecord(0).received);

@@ -17,6 +17,7 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <filesystem>
 #include <functional>
 #include <memory>
 #include <string>
@@ -210,6 +211,35 @@ TEST(SSLContext, SystemStoreIsNotWhatTheEnvironmentNames) {
   EXPECT_FALSE(trusted);
   // A bare system has no trust store at all; that is said, not passed over.
   EXPECT_TRUE(refusal.empty() || refusal == "The operating system's trust store was not found") << refusal;
+}
+
+int CountAnchors(const SSLContextOptions& options) {
+  const ContextHandle client = MakeClientContext(CreateSSLContext(options));
+  return sk_X509_OBJECT_num(X509_STORE_get0_objects(SSL_CTX_get_cert_store(client.get())));
+}
+
+TEST(SSLContext, TrustsTheSystemsAnchorsOnlyWhenAskedTo) {
+  SSLContextOptions options;
+  EXPECT_EQ(CountAnchors(options), 0);
+  options.useSystemStore = true;
+  // A bare system has none.
+  const bool hasFile = std::filesystem::is_regular_file(X509_get_default_cert_file()) ||
+                       std::filesystem::is_regular_file("/etc/ssl/certs/ca-certificates.crt");
+  if (!hasFile && !std::filesystem::is_directory(X509_get_default_cert_dir())) {
+    EXPECT_EQ(RefusalOf(options), "CryptoException: The operating system's trust store was not found");
+  } else {
+    EXPECT_EQ(CountAnchors(options) > 0, hasFile);
+  }
+}
+
+// Whatever the system's configuration of OpenSSL has as its defaults.
+TEST(SSLContext, SetsTheLeastSecurityAndTheOldestVersion) {
+  const ContextHandle client(SSL_CTX_new(TLS_client_method()));
+  SSL_CTX_set_security_level(client.get(), 0);
+  ASSERT_EQ(SSL_CTX_set_min_proto_version(client.get(), TLS1_VERSION), 1);
+  static_cast<const SSLContextImpl&>(*CreateSSLContext(SSLContextOptions())).ConfigureSslCtx(client.get());
+  EXPECT_EQ(SSL_CTX_get_security_level(client.get()), 2);
+  EXPECT_EQ(SSL_CTX_get_min_proto_version(client.get()), TLS1_2_VERSION);
 }
 
 TEST(SSLContext, ShowsTheClientCertificateWithItsIntermediates) {

@@ -117,6 +117,18 @@ TEST(Signature, IsTheSameWhereverItIsPutAfterwards) {
   EXPECT_TRUE(read->Verify(resolver.Get()));
 }
 
+TEST(Signature, ThatWasMadeHereIsRefusedOnceTheElementChanges) {
+  const Ref<Document> document = ParseDocument("<a ID=\"b\">t</a>");
+  const Ref<Signature> signature = MakeBlank(document->GetDocumentElement());
+  signature->AddReference("#b", kSha256)->AddTransform(kExclusiveC14n);
+  signature->SetKeyInfo(MakeX509Data({Signer()}));
+  signature->Sign(Signer().GetKey().Get());
+  const Ref<KeyInfoResolver> resolver = CreateTrustChainKeyResolver(Trust({Signer()}));
+  EXPECT_TRUE(signature->Verify(resolver.Get()));
+  document->GetDocumentElement()->DefineAttribute("changed", "");
+  EXPECT_FALSE(signature->Verify(resolver.Get()));
+}
+
 TEST(Signature, OverAnElementOfNoDocumentCoversTheElement) {
   Ref<ElementNode> element;
   CreateElementNode("", "detached", element);
@@ -356,6 +368,7 @@ TEST(Signature, RefusesEveryOtherStructure) {
        "xml-exc-c14n#\"><ec:InclusiveNamespaces xmlns:ec=\"http://www.w3.org/2001/10/xml-exc-c14n#\" PrefixList="
        "\"a\"><x/></ec:InclusiveNamespaces></ds:Transform></ds:Transforms>",
        "Unexpected element 'x' in 'ec:InclusiveNamespaces'", "<x/>"},
+      {"</ds:Transforms>", "<x/></ds:Transforms>", "Unexpected element 'x' in 'ds:Transforms'", "<x/>"},
       {"<ds:Transforms>", "<ds:Transforms x=\"\">", "Unexpected attribute 'x' in 'ds:Transforms'",
        "<ds:Transforms "},
       {"<ds:DigestMethod ", "<ds:DigestMethod x=\"\" ", "Unexpected attribute 'x' in 'ds:DigestMethod'",
@@ -371,6 +384,8 @@ TEST(Signature, RefusesEveryOtherStructure) {
        "Unexpected text in 'ds:DigestMethod'", "<ds:DigestMethod"},
       {"<ds:DigestValue>", "<ds:DigestValue><!-- -->", "Element 'ds:DigestValue' must hold one text",
        "<ds:DigestValue>"},
+      {"<ds:DigestValue>", "<ds:DigestValue><x/></ds:DigestValue><ds:DigestValue>",
+       "Element 'ds:DigestValue' must hold one text", "<ds:DigestValue>"},
       {"<ds:DigestValue>", "<ds:DigestValue>=", "Element 'ds:DigestValue' must hold base64 text",
        "<ds:DigestValue>"},
       {"<ds:DigestValue>", "<ds:DigestValue x=\"\">", "Unexpected attribute 'x' in 'ds:DigestValue'",

@@ -162,6 +162,18 @@ TEST(TransferFailure, TellsAnEndWithoutGoodbye) {
             Tell(MakeFacts(CURLE_RECV_ERROR, engineText)));
 }
 
+TEST(TlsFailureReason, IsReadOnlyFromAReasonOfOpenSslsTls) {
+  const TlsFailureReason reason = FindTlsFailureReason("error:0A00010B:SSL routines::wrong version number");
+  EXPECT_EQ(reason.kind, TlsFailureKind::NOT_TLS);
+  EXPECT_EQ(reason.text, "wrong version number");
+  // No mark before the number; the same number of another part of OpenSSL.
+  for (const char* const engineText : {"code 0A00010B", "error:0300010B:digital envelope routines::"}) {
+    const TlsFailureReason none = FindTlsFailureReason(engineText);
+    EXPECT_EQ(none.kind, TlsFailureKind::OTHER) << engineText;
+    EXPECT_EQ(none.text, "") << engineText;
+  }
+}
+
 TEST(TransferFailure, MasksControlCharactersOfTheEngine) {
   EXPECT_EQ("Exchange with sts.test:443 failed: a?b", Tell(MakeFacts(CURLE_BAD_FUNCTION_ARGUMENT, "a\nb")));
   EXPECT_EQ("Exchange with sts.test:443 failed: Out of memory", Tell([] {

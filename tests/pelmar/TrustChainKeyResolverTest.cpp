@@ -3,6 +3,7 @@
 
 #include "pelmar/xml/TrustChainKeyResolver.h"
 
+#include "pelmar/crypto/CertificateChain.h"
 #include "pelmar/crypto/VerifiedChainCache.h"
 #include "support/Pki.h"
 #include "support/SignatureDocuments.h"
@@ -122,6 +123,7 @@ TEST(TrustChainKeyResolver, FindsTheSignerWhateverTheOrder) {
   const Chain& c = GetChain();
   EXPECT_EQ(Resolve({c.intermediate, c.leaf}, Trust({c.root})), "CN=Leaf");
   EXPECT_EQ(Resolve({c.root, c.intermediate, c.leaf}, Trust({c.root})), "CN=Leaf");
+  EXPECT_EQ(Resolve({c.intermediate, c.leaf, c.leaf}, Trust({c.root})), "CN=Leaf");
 }
 
 TEST(TrustChainKeyResolver, TakesTheFirstOfSeveralPossibleSigners) {
@@ -129,6 +131,31 @@ TEST(TrustChainKeyResolver, TakesTheFirstOfSeveralPossibleSigners) {
   const Identity sibling = MakeIssued(c.intermediate, Named("Sibling", 3));
   EXPECT_EQ(Resolve({sibling, c.leaf, c.intermediate}, Trust({c.root})), "CN=Sibling");
   EXPECT_EQ(Resolve({c.leaf, sibling, c.intermediate}, Trust({c.root})), "CN=Leaf");
+  EXPECT_EQ(Resolve({c.intermediate, c.leaf, sibling}, Trust({c.root})),
+            "The certificate's key usage does not allow signatures (CN=Intermediate)");
+}
+
+// That it issued itself makes a certificate no issuer of others.
+TEST(TrustChainKeyResolver, TakesASelfSignedCertificateForAPossibleSigner) {
+  const Chain& c = GetChain();
+  CertificateSpec spec = Named("Self-signed", 3);
+  spec.keyUsage = "digitalSignature,keyCertSign";
+  const Identity selfSigned = MakeSelfSigned(spec);
+  EXPECT_EQ(Resolve({selfSigned, c.leaf, c.intermediate}, Trust({selfSigned, c.root})), "CN=Self-signed");
+}
+
+TEST(TrustChainKeyResolver, TakesTheFirstWhereAllIssuedEachOther) {
+  CertificateSpec spec = CaNamed("One", 3);
+  spec.keyUsage = "digitalSignature,keyCertSign";
+  const Identity root = MakeSelfSigned(spec);
+  spec = CaNamed("Other", 4);
+  spec.keyUsage = "digitalSignature,keyCertSign";
+  const Identity other = MakeIssued(root, spec);
+  spec = CaNamed("One", 3);
+  spec.keyUsage = "digitalSignature,keyCertSign";
+  const Identity one = MakeIssued(other, spec);
+  EXPECT_EQ(Resolve({one, other}, Trust({one, other})), "CN=One");
+  EXPECT_EQ(Resolve({other, one}, Trust({one, other})), "CN=Other");
 }
 
 TEST(TrustChainKeyResolver, ReadsCertificatesOfSeveralX509Data) {
@@ -360,6 +387,29 @@ TEST(TrustChainKeyResolver, NeverRemembersBeyondTheTimeOfTheChain) {
             "Certificate chain is not trusted: certificate is not yet valid (CN=Leaf)");
 }
 
+// Whichever of them begins last and ends first.
+TEST(TrustStore, TellsTheTimeInWhichAllCertificatesOfTheChainAreValid) {
+  for (std::size_t shortest = 0; shortest < 3; ++shortest) {
+    CertificateSpec specs[] = {CaNamed("Root", 1), CaNamed("Intermediate", 2), Named("Leaf")};
+    for (CertificateSpec& spec : specs) {
+      spec.notBefore = -2 * kDay;
+      spec.notAfter = 2 * kDay;
+    }
+    specs[shortest].notBefore = -kDay;
+    specs[shortest].notAfter = kDay;
+    const Identity root = MakeSelfSigned(specs[0]);
+    const Identity intermediate = MakeIssued(root, specs[1]);
+    const Identity chain[] = {root, intermediate, MakeIssued(intermediate, specs[2])};
+    const auto own = [&chain](std::size_t i) {
+      return Pelmar::Crypto::ToCertificateImpl(chain[i].certificate.Get());
+    };
+    const Pelmar::Crypto::ChainValidity validity =
+        Pelmar::Crypto::TrustStore({own(0)}).Verify(*own(2), {own(1)}, FromNow(0));
+    EXPECT_EQ(validity.notBefore.ToString(), chain[shortest].certificate->GetNotBefore().ToString());
+    EXPECT_EQ(validity.notAfter.ToString(), chain[shortest].certificate->GetNotAfter().ToString());
+  }
+}
+
 TEST(TrustChainKeyResolver, RemembersPerTrustList) {
   const Chain& c = GetChain();
   const Identity other = MakeCa("Other", 5);
@@ -439,6 +489,25 @@ TEST(VerifiedChainCache, ForgetsWhatWasUsedLeastRecently) {
   EXPECT_TRUE(cache.Find(Fingerprint(1), FromNow(0)));
   EXPECT_FALSE(cache.Find(Fingerprint(2), FromNow(0)));
   EXPECT_TRUE(cache.Find(Fingerprint(3), FromNow(0)));
+}
+
+TEST(VerifiedChainCache, HoldsEachChainOnceAndNoMoreThanItsCapacity) {
+  const Identity signer = MakeSelfSigned(Named("Signer"));
+  const Pelmar::Crypto::ChainValidity always = {FromNow(-kDay), FromNow(kDay)};
+  const Pelmar::Crypto::ChainFingerprint chains[] = {Fingerprint(0), Fingerprint(1), Fingerprint(2),
+                                                     Fingerprint(3)};
+  VerifiedChainCache cache(2);
+  for (const Pelmar::Crypto::ChainFingerprint& chain : {chains[0], chains[0], chains[1]}) {
+    cache.Add(chain, signer.certificate, always);
+  }
+  EXPECT_TRUE(cache.Find(chains[0], FromNow(0)));
+  EXPECT_TRUE(cache.Find(chains[1], FromNow(0)));
+  cache.Add(chains[2], signer.certificate, always);
+  cache.Add(chains[3], signer.certificate, always);
+  EXPECT_FALSE(cache.Find(chains[0], FromNow(0)));
+  EXPECT_FALSE(cache.Find(chains[1], FromNow(0)));
+  EXPECT_TRUE(cache.Find(chains[2], FromNow(0)));
+  EXPECT_TRUE(cache.Find(chains[3], FromNow(0)));
 }
 
 TEST(VerifiedChainCache, TellsListsApartThatHaveTheSameBytes) {

@@ -169,6 +169,11 @@ TEST(ServiceCancellation, EndsTheNameLookUp) {
   RunningCall call(ConfigFor("http://" + std::string(TestSupport::kSlowHost) + "/sts"));
   resolver.AwaitLookUp();
   EXPECT_EQ(kCancelled, call.CancelAndWait());
+  // The look-up itself goes on, and holds up nobody else.
+  const TestSupport::ClosedPort port;
+  const std::string endpoint = "127.0.0.1:" + std::to_string(port.GetPort());
+  EXPECT_EQ("CommunicationException: Connection refused by " + endpoint,
+            Acquire(*CreateSecurityTokenService(ConfigFor("http://" + endpoint + "/sts"))));
 }
 
 TEST(ServiceCancellation, EndsConnecting) {

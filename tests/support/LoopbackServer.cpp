@@ -86,6 +86,13 @@ void DemandClientCertificate(SSL_CTX* context, const Identity& ca) {
   SSL_CTX_set_verify(context, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);
 }
 
+/// Called within `StartTls`, which has said where to. None is chosen.
+int NoteProtocols(SSL* tls, const unsigned char**, unsigned char*, const unsigned char* data, unsigned size,
+                  void*) {
+  static_cast<std::string*>(SSL_get_app_data(tls))->assign(data, data + size);
+  return SSL_TLSEXT_ERR_NOACK;
+}
+
 SSL_CTX* MakeTlsContext(const TlsServerSettings& settings) {
   SSL_CTX* const context = SSL_CTX_new(TLS_server_method());
   Require(context != nullptr, "no TLS context");
@@ -96,6 +103,7 @@ SSL_CTX* MakeTlsContext(const TlsServerSettings& settings) {
   SSL_CTX_set_security_level(context, settings.maxVersion == 0 ? 2 : 0);
   SSL_CTX_set_min_proto_version(context, 0);
   SSL_CTX_set_max_proto_version(context, settings.maxVersion);
+  SSL_CTX_set_alpn_select_cb(context, NoteProtocols, nullptr);
   Require(SSL_CTX_use_certificate(context, ToX509(settings.identity).get()) == 1, "bad server certificate");
   Require(SSL_CTX_use_PrivateKey(context, settings.identity.keyPair.GetHandle()) == 1, "bad server key");
   for (const Identity& issuer : settings.chain) {
@@ -182,6 +190,8 @@ void ServerConnection::StartTls() {
   _tls.reset(SSL_new(_server._tlsContext.get()));
   Require(_tls != nullptr, "no TLS");
   SSL_set_fd(_tls.get(), _socket);
+  std::string protocols;
+  SSL_set_app_data(_tls.get(), &protocols);
   if (_server._tlsSettings->inSingleBytes) {
     SSL_set0_wbio(_tls.get(), MakeSlowBio(this));
   }
@@ -191,7 +201,9 @@ void ServerConnection::StartTls() {
     record.isSecured = isSecured;
     record.wasResumed = isSecured && SSL_session_reused(_tls.get()) == 1;
     record.serverNameAsked = name == nullptr ? "" : name;
+    record.protocolsAsked = protocols;
   });
+  SSL_set_app_data(_tls.get(), nullptr);
   if (!isSecured) {
     // Read on, for closing over unread bytes would reset the connection and could take the alert with it.
     _tls.reset();

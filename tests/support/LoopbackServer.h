@@ -35,6 +35,7 @@ struct ConnectionRecord {
   bool isSecured = false;       ///< A TLS handshake was completed.
   bool wasResumed = false;      ///< ... by resuming an earlier session.
   std::string serverNameAsked;  ///< The name of the server_name extension.
+  std::string protocolsAsked;   ///< What the ALPN extension holds: names, each behind a byte with its length.
   bool isEnded = false;         ///< The script is done, or the peer or the test broke it off.
 };
 

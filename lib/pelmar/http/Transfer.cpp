@@ -67,7 +67,6 @@ Transfer::Transfer(const Ref<Exchange>& exchange, const SharedState& shared, Ope
     throw HttpException("The HTTP engine cannot be set up");
   }
   Set(CURLOPT_ERRORBUFFER, _engineText);
-  Set(CURLOPT_PRIVATE, this);
   Set(CURLOPT_SHARE, _shared.handle.get());
   SetIsolation();
   SetProxy();
