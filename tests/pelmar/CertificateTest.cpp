@@ -94,6 +94,15 @@ TEST(Certificate, FirstOfAPemTextIsTaken) {
             first->GetDer());
 }
 
+TEST(Certificate, IsReadUnderItsOldPemLabelToo) {
+  const Ref<const Certificate> certificate = MakeNamed("Old");
+  std::string pem = certificate->ToPem();
+  for (std::size_t at = 0; (at = pem.find(" CERTIFICATE", at)) != std::string::npos; at += 17) {
+    pem.insert(at, " X509");
+  }
+  EXPECT_EQ(CreateCertificateFromPem(pem)->GetDer(), certificate->GetDer());
+}
+
 TEST(Certificate, AllOfAPemTextAreReadInOrderPastOtherObjectsAndText) {
   const Ref<const Certificate> first = MakeNamed("First");
   const Ref<const Certificate> second = MakeNamed("Second");

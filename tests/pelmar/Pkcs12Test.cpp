@@ -21,7 +21,9 @@
 #include <openssl/pkcs12.h>
 #include <openssl/x509.h>
 
+#include <algorithm>
 #include <functional>
+#include <iterator>
 #include <list>
 #include <stdexcept>
 #include <string>
@@ -330,13 +332,55 @@ class FileBuilder final {
     return *this;
   }
 
+  FileBuilder& AddUnreadableKey() {
+    PKCS8_PRIV_KEY_INFO* const key = PKCS8_PRIV_KEY_INFO_new();
+    auto* const bytes = static_cast<unsigned char*>(OPENSSL_zalloc(1));
+    Check(PKCS8_pkey_set0(key, OBJ_nid2obj(NID_rsaEncryption), 0, V_ASN1_NULL, nullptr, bytes, 1) == 1);
+    PKCS12_SAFEBAG* const bag = PKCS12_SAFEBAG_create0_p8inf(key);
+    Check(bag != nullptr && sk_PKCS12_SAFEBAG_push(_bags, bag) > 0);
+    return *this;
+  }
+
+  /// In a bag for a certificate of this type.
+  FileBuilder& AddUnreadableCertificate(int type) {
+    ASN1_OCTET_STRING* const content = ASN1_OCTET_STRING_new();
+    PKCS12_SAFEBAG* const bag =
+        PKCS12_item_pack_safebag(content, ASN1_ITEM_rptr(ASN1_OCTET_STRING), type, NID_certBag);
+    ASN1_OCTET_STRING_free(content);
+    Check(bag != nullptr && sk_PKCS12_SAFEBAG_push(_bags, bag) > 0);
+    return *this;
+  }
+
   Bytes Build(int macRounds = 1) const {
     STACK_OF(PKCS7)* safes = nullptr;
     Check(PKCS12_add_safe(&safes, _bags, -1, 0, nullptr) == 1);
+    return BuildOf(safes, macRounds);
+  }
+
+  /// A file of these parts, which are the builder's from now on.
+  static Bytes BuildOf(STACK_OF(PKCS7) * safes, int macRounds = 1) {
     PKCS12* const file = PKCS12_add_safes(safes, 0);
     sk_PKCS7_pop_free(safes, PKCS7_free);
-    Check(PKCS12_set_mac(file, kPassPhrase.data(), static_cast<int>(kPassPhrase.size()), nullptr, 0,
-                         macRounds, EVP_sha256()) == 1);
+    return Finish(file, macRounds);
+  }
+
+  static Bytes BuildOf(PKCS7* safe) {
+    STACK_OF(PKCS7)* const safes = sk_PKCS7_new_null();
+    Check(sk_PKCS7_push(safes, safe) > 0);
+    return BuildOf(safes);
+  }
+
+  /// A new MAC over what the file has become.
+  static Bytes MakeMacRight(const Bytes& der) {
+    const unsigned char* position = der.data();
+    PKCS12* const file = d2i_PKCS12(nullptr, &position, static_cast<long>(der.size()));
+    return Finish(file, 1);
+  }
+
+ private:
+  static Bytes Finish(PKCS12* file, int macRounds) {
+    Check(file != nullptr && PKCS12_set_mac(file, kPassPhrase.data(), static_cast<int>(kPassPhrase.size()),
+                                            nullptr, 0, macRounds, EVP_sha256()) == 1);
     Bytes der(static_cast<std::size_t>(i2d_PKCS12(file, nullptr)));
     unsigned char* position = der.data();
     i2d_PKCS12(file, &position);
@@ -344,7 +388,6 @@ class FileBuilder final {
     return der;
   }
 
- private:
   STACK_OF(PKCS12_SAFEBAG) * _bags;
 };
 
@@ -387,6 +430,50 @@ TEST(Pkcs12, RefusesOtherContents) {
             "The PKCS #12 file holds something that is neither a private key nor a certificate");
 }
 
+TEST(Pkcs12, RefusesUnreadableContents) {
+  const Identity& leaf = TheFamily().leaf;
+  EXPECT_EQ(RefusalOf(FileBuilder().AddUnreadableKey().AddCertificate(leaf).Build()),
+            "The PKCS #12 file holds a private key that cannot be read");
+  for (const int type : {NID_x509Certificate, NID_sdsiCertificate}) {
+    EXPECT_EQ(
+        RefusalOf(FileBuilder().AddKey(leaf).AddCertificate(leaf).AddUnreadableCertificate(type).Build()),
+        "The PKCS #12 file holds a certificate that cannot be read");
+  }
+}
+
+PKCS7* MakePart(int type) {
+  PKCS7* const part = PKCS7_new();
+  part->type = OBJ_nid2obj(type);
+  return part;
+}
+
+TEST(Pkcs12, RefusesPartsThatItDoesNotKnow) {
+  const char* const refusal =
+      "The PKCS #12 file has a part that is neither plain nor encrypted with the pass phrase";
+  EXPECT_EQ(RefusalOf(FileBuilder::BuildOf(MakePart(NID_pkcs7_signed))), refusal);
+  EXPECT_EQ(RefusalOf(FileBuilder::BuildOf(MakePart(NID_pkcs7_encrypted))), refusal);
+  PKCS7* const other = MakePart(NID_id_smime_ct_authData);
+  other->d.other = ASN1_TYPE_new();
+  ASN1_TYPE_set(other->d.other, V_ASN1_OCTET_STRING, ASN1_OCTET_STRING_new());
+  EXPECT_EQ(RefusalOf(FileBuilder::BuildOf(other)), refusal);
+}
+
+TEST(Pkcs12, RefusesPartsThatAreDamaged) {
+  const char* const refusal = "The PKCS #12 file is damaged inside";
+  PKCS7* const part = MakePart(NID_pkcs7_data);
+  part->d.data = ASN1_OCTET_STRING_new();
+  EXPECT_EQ(RefusalOf(FileBuilder::BuildOf(part)), refusal);
+
+  // The list of parts is an octet string within the first "data".
+  Bytes der = FileBuilder::BuildOf(MakePart(NID_pkcs7_data));
+  const unsigned char data[] = {0x2A, 0x86, 0x48, 0x86, 0xF7, 0x0D, 0x01, 0x07, 0x01};
+  const auto at = std::search(der.begin(), der.end(), std::begin(data), std::end(data));
+  const auto tag = std::find(at, der.end(), 0x30);
+  ASSERT_NE(tag, der.end());
+  *tag = 0x31;
+  EXPECT_EQ(RefusalOf(FileBuilder::MakeMacRight(der)), refusal);
+}
+
 TEST(Pkcs12, HasALimitedNumberOfObjects) {
   const Family& family = TheFamily();
   FileBuilder builder;
@@ -426,8 +513,8 @@ X509_ALGOR* AlgorithmWithRounds(long long rounds) {
   return algorithm;
 }
 
-std::string VerdictOn(Pkcs12Profile& profile, long long rounds) {
-  X509_ALGOR* const algorithm = AlgorithmWithRounds(rounds);
+/// Takes the algorithm.
+std::string VerdictOn(Pkcs12Profile& profile, X509_ALGOR* algorithm) {
   std::string verdict = "accepted";
   try {
     profile.RequireEncryption(algorithm);
@@ -436,6 +523,32 @@ std::string VerdictOn(Pkcs12Profile& profile, long long rounds) {
   }
   X509_ALGOR_free(algorithm);
   return verdict;
+}
+
+std::string VerdictOn(Pkcs12Profile& profile, long long rounds) {
+  return VerdictOn(profile, AlgorithmWithRounds(rounds));
+}
+
+TEST(Pkcs12, RefusesAnotherDerivationOfItsKeys) {
+  Pkcs12Profile profile;
+  EXPECT_EQ(VerdictOn(profile, PKCS5_pbe2_set_scrypt(EVP_aes_256_cbc(), nullptr, 0, nullptr, 16, 1, 1)),
+            "The PKCS #12 file is encrypted with scrypt; PBES2 with PBKDF2 and AES-CBC is needed");
+}
+
+TEST(Pkcs12, RefusesUnreadableParametersOfItsEncryption) {
+  const char* const refusal = "The PKCS #12 file is encrypted with parameters that cannot be read";
+  Pkcs12Profile profile;
+  X509_ALGOR* const outer = X509_ALGOR_new();
+  X509_ALGOR_set0(outer, OBJ_nid2obj(NID_pbes2), V_ASN1_NULL, nullptr);
+  EXPECT_EQ(VerdictOn(profile, outer), refusal);
+
+  X509_ALGOR* const inner = PKCS5_pbe2_set_iv(EVP_aes_256_cbc(), 1, nullptr, 16, nullptr, NID_hmacWithSHA256);
+  PBE2PARAM* const parameters =
+      static_cast<PBE2PARAM*>(ASN1_TYPE_unpack_sequence(ASN1_ITEM_rptr(PBE2PARAM), inner->parameter));
+  X509_ALGOR_set0(parameters->keyfunc, OBJ_nid2obj(NID_id_pbkdf2), V_ASN1_NULL, nullptr);
+  Check(ASN1_TYPE_pack_sequence(ASN1_ITEM_rptr(PBE2PARAM), parameters, &inner->parameter) != nullptr);
+  PBE2PARAM_free(parameters);
+  EXPECT_EQ(VerdictOn(profile, inner), refusal);
 }
 
 TEST(Pkcs12, CountsTheRoundsOfAllItsParts) {

@@ -10,6 +10,10 @@
 
 #include <gtest/gtest.h>
 
+#include <openssl/evp.h>
+#include <openssl/pkcs12.h>
+#include <openssl/x509.h>
+
 #include <functional>
 #include <string>
 #include <thread>
@@ -165,6 +169,20 @@ TEST(PrivateKey, RefusesAnEncryptedKeyWithoutPassPhrase) {
     EXPECT_EQ(RefusalOf([&pem] { CreatePrivateKeyFromPem(pem); }),
               "The private key is encrypted and there is no pass phrase");
   }
+  // None is not an empty one.
+  const std::string pem = pair.ToEncryptedPem("");
+  EXPECT_EQ(RefusalOf([&pem] { CreatePrivateKeyFromPem(pem); }),
+            "The private key is encrypted and there is no pass phrase");
+  EXPECT_EQ(RefusalOf([&pem] { CreatePrivateKeyFromPem(pem, ""); }), "accepted");
+}
+
+// OpenSSL asks for 1024 bytes at most.
+TEST(PrivateKey, TakesALongPassPhrase) {
+  const std::string passPhrase(1024, 'x');
+  const std::string pem = KeyPair::Get(KeyKind::EC_P256).ToEncryptedPem(passPhrase);
+  EXPECT_EQ(RefusalOf([&] { CreatePrivateKeyFromPem(pem, passPhrase); }), "accepted");
+  EXPECT_EQ(RefusalOf([&] { CreatePrivateKeyFromPem(pem, passPhrase + "x"); }),
+            "The private key cannot be read: the pass phrase is wrong or the key is damaged");
 }
 
 TEST(PrivateKey, RefusesAWrongPassPhrase) {
@@ -224,6 +242,21 @@ TEST(PrivateKey, RefusesDerThatIsNoKeyOrGoesOn) {
     EXPECT_EQ(RefusalOf([&plain] { CreatePrivateKeyFromDer(plain, kPassPhrase); }),
               "There is no private key that can be read");
   }
+}
+
+TEST(PrivateKey, RefusesEncryptedDerThatHoldsNoKey) {
+  PKCS8_PRIV_KEY_INFO* const content = PKCS8_PRIV_KEY_INFO_new();
+  auto* const bytes = static_cast<unsigned char*>(OPENSSL_zalloc(1));
+  ASSERT_EQ(PKCS8_pkey_set0(content, OBJ_nid2obj(NID_rsaEncryption), 0, V_ASN1_NULL, nullptr, bytes, 1), 1);
+  X509_SIG* const envelope = PKCS8_encrypt(-1, EVP_aes_256_cbc(), kPassPhrase, -1, nullptr, 0, 1, content);
+  PKCS8_PRIV_KEY_INFO_free(content);
+  ASSERT_NE(envelope, nullptr);
+  std::vector<unsigned char> der(static_cast<std::size_t>(i2d_X509_SIG(envelope, nullptr)));
+  unsigned char* position = der.data();
+  i2d_X509_SIG(envelope, &position);
+  X509_SIG_free(envelope);
+  EXPECT_EQ(RefusalOf([&der] { CreatePrivateKeyFromDer(der, kPassPhrase); }),
+            "There is no private key that can be read");
 }
 
 TEST(PrivateKey, SignsOnSeveralThreadsAtOnce) {
