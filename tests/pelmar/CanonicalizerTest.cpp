@@ -206,6 +206,13 @@ TEST(Canonicalizer, RefusesAnUndeclaredPrefix) {
 }
 
 // Canonical XML 1.0, section 1.3.
+TEST(Canonicalizer, TakesEveryKindOfScheme) {
+  for (const std::string uri : {"urn:x", "URN:x", "a1:x", "a9+b-c.d:x"}) {
+    EXPECT_EQ(SubtreeText("<a><b xmlns='" + uri + "'/></a>", "b", kExclusiveC14n),
+              "<b xmlns=\"" + uri + "\"></b>");
+  }
+}
+
 TEST(Canonicalizer, RefusesARelativeNamespaceUri) {
   for (const std::string uri : {"relative", "../up", "/path", "#part", ":", "1a:b", "a/b:c"}) {
     SCOPED_TRACE(uri);

@@ -11,8 +11,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <condition_variable>
 #include <future>
 #include <memory>
+#include <mutex>
 #include <stdexcept>
 #include <thread>
 
@@ -151,7 +153,47 @@ TEST(TokenProviderAsync, IsAnsweredOnTheSpotWhenTheSchedulerTakesNoMoreWork) {
   EXPECT_THAT(ear.heard, ElementsAre("_1", "_1"));
 }
 
+TEST(TokenProviderAsync, MayBeUsedInACompletionOnTheSpot) {
+  const ProviderWorld world;
+  const auto provider = world.MakeProvider();
+  provider->GetToken();
+  world.scheduler->Refuse();
+  std::string heard;
+  provider->GetTokenAsync([&](const Token& token, const Pelmar::Exception*) {
+    provider->Invalidate();
+    heard = token->GetId();
+  });
+  EXPECT_EQ(heard, "_1");
+}
+
 // ---- The end ----
+
+/// Stands still, and counts how often it is read.
+class CountedClock final : public Quorlin::TokenProviderClock {
+ public:
+  explicit CountedClock(long long now) : _now(now) {}
+
+  long long GetUtcTime() const override {
+    const std::lock_guard<std::mutex> lock(_mutex);
+    ++_readings;
+    _changed.notify_all();
+    return _now;
+  }
+  int CountReadings() const {
+    const std::lock_guard<std::mutex> lock(_mutex);
+    return _readings;
+  }
+  void AwaitReadings(int count) const {
+    std::unique_lock<std::mutex> lock(_mutex);
+    _changed.wait(lock, [&] { return _readings >= count; });
+  }
+
+ private:
+  const long long _now;
+  mutable std::mutex _mutex;
+  mutable std::condition_variable _changed;
+  mutable int _readings = 0;
+};
 
 TEST(TokenProviderEnd, WhoWaitsWithoutAThreadIsTold) {
   const ProviderWorld world;
@@ -197,14 +239,20 @@ TEST(TokenProviderEnd, DoesNotWaitForARequestOnItsWayAndWakesThoseWhoDo) {
     released.get_future().wait();
     return world.service->MakeToken(600);
   });
+  const auto clock = boost::make_shared<CountedClock>(world.clock->GetUtcTime());
+  Quorlin::TokenProviderOptions options = world.options;
+  options.clock = clock;
   const auto keeper =
-      std::make_shared<Quorlin::TokenKeeper>(world.service, Quorlin::RequestByCertificate(), world.options);
+      std::make_shared<Quorlin::TokenKeeper>(world.service, Quorlin::RequestByCertificate(), options);
   const auto get = [keeper] {
     return VerdictOf([&] { keeper->Get(); });
   };
   std::future<std::string> asking = std::async(std::launch::async, get);
   begun.get_future().wait();
+  const int readings = clock->CountReadings();
   std::future<std::string> waiting = std::async(std::launch::async, get);
+  // The second is made under the lock, which is held until the wait begins: Close comes after that.
+  clock->AwaitReadings(readings + 2);
   keeper->Close();
   EXPECT_EQ(waiting.get(), kDestroyed);
   released.set_value();
