@@ -338,6 +338,91 @@ TEST(Canonicalizer, MayBeUsedAgainAfterAFailure) {
   EXPECT_EQ(writer->GetText(), "<p:a xmlns:p=\"urn:p\"></p:a>");
 }
 
+// ---- Elements that are like each other
+
+// The same tree, in which nothing is shared with anything.
+Ref<ElementNode> MakeCopy(const ElementNode* element) {
+  Ref<ElementNode> copy;
+  CreateElementNode(element->GetPrefix(), element->GetLocalName(), copy);
+  for (const Attribute& attribute : element->GetAttributes()) {
+    copy->DefineAttribute(attribute.name, attribute.value);
+  }
+  for (const Node* child = element->GetFirstChild(); child != nullptr; child = child->GetNextSibling()) {
+    if (const TextNode* const text = AsText(child)) {
+      Ref<TextNode> textCopy;
+      CreateTextNode(textCopy);
+      textCopy->SetText(text->GetText());
+      copy->AppendChild(textCopy);
+    } else if (const ElementNode* const childElement = AsElement(child)) {
+      copy->AppendChild(MakeCopy(childElement));
+    }
+  }
+  return copy;
+}
+
+void ExpectSameAsCopy(const std::string& text) {
+  const Ref<Document> document = ParseXmlText(text);
+  const Ref<ElementNode> copy = MakeCopy(document->GetDocumentElement());
+  for (const char* const algorithm : {kC14nOnTheWire, kExclusiveC14n, kExclusiveC14nWithComments}) {
+    EXPECT_EQ(CanonicalText(document->GetDocumentElement(), algorithm), CanonicalText(copy.Get(), algorithm));
+  }
+}
+
+TEST(Canonicalizer, WritesSiblingsThatAreAlikeAlike) {
+  const std::string a = "<p:a q:t='1' s='&lt;'>";
+  EXPECT_EQ(
+      RootText("<r xmlns:p='urn:p' xmlns:q='urn:q'>" + a + "1</p:a>" + a + "2</p:a> " + a + "</p:a></r>",
+               kExclusiveC14n),
+      "<r><p:a xmlns:p=\"urn:p\" xmlns:q=\"urn:q\" s=\"&lt;\" q:t=\"1\">1</p:a>"
+      "<p:a xmlns:p=\"urn:p\" xmlns:q=\"urn:q\" s=\"&lt;\" q:t=\"1\">2</p:a> "
+      "<p:a xmlns:p=\"urn:p\" xmlns:q=\"urn:q\" s=\"&lt;\" q:t=\"1\"></p:a></r>");
+}
+
+// The prefixes of equal tags stand for what the nearest declarations say.
+TEST(Canonicalizer, TellsElementsApartThatOnlyLookAlike) {
+  const std::string a = "<p:a p:t='1'>1</p:a>";
+  EXPECT_EQ(RootText("<r xmlns:p='urn:1'>" + a + "<b xmlns:p='urn:2'>" + a + "</b>" + a + "<b>" + a +
+                         "</b><p:a p:t='1'><p:a p:t='1'/></p:a></r>",
+                     kExclusiveC14n),
+            "<r><p:a xmlns:p=\"urn:1\" p:t=\"1\">1</p:a><b><p:a xmlns:p=\"urn:2\" p:t=\"1\">1</p:a></b>"
+            "<p:a xmlns:p=\"urn:1\" p:t=\"1\">1</p:a><b><p:a xmlns:p=\"urn:1\" p:t=\"1\">1</p:a></b>"
+            "<p:a xmlns:p=\"urn:1\" p:t=\"1\"><p:a p:t=\"1\"></p:a></p:a></r>");
+  EXPECT_EQ(
+      RootText("<r><a t='1' u='2'/><a t='1'/><b t='1'/><b t='2'/><b/><b/><b t='1'/></r>", kExclusiveC14n),
+      "<r><a t=\"1\" u=\"2\"></a><a t=\"1\"></a><b t=\"1\"></b><b t=\"2\"></b><b></b><b></b>"
+      "<b t=\"1\"></b></r>");
+}
+
+// Declarations of their own, children, the buffer's end at each byte of a tag, and tags longer than it.
+TEST(Canonicalizer, WritesElementsThatAreAlikeLikeOthers) {
+  ExpectSameAsCopy("<r xmlns:p='urn:1'><a xmlns:p='urn:2' p:t='1'/><a xmlns:p='urn:2' p:t='1'/><p:a/></r>");
+  ExpectSameAsCopy("<r xmlns:p='urn:1'><a p:t='1'/><a p:t='1'><a p:t='1'/><a p:t='1'/></a><a p:t='1'/></r>");
+  ExpectSameAsCopy("<r><a xmlns='urn:1'/><a xmlns='urn:1'/><a/><a/><a xmlns=''/><a xmlns=''/></r>");
+  for (std::size_t shift = 0; shift < 64; ++shift) {
+    std::string text = "<r xmlns:p='urn:1'>" + std::string(4000 + shift, '.');
+    for (int i = 0; i < 8; ++i) {
+      text += "<a p:t='" + std::string(i < 6 ? 9 : 5000, 'v') + "'>text</a>";
+    }
+    ExpectSameAsCopy(text + "</r>");
+  }
+}
+
+// What is left out stays out, also when it is like what is not.
+TEST(Canonicalizer, LeavesOutOneOfElementsThatAreAlike) {
+  const Ref<Document> document = ParseXmlText("<r><a t='1'>1</a><a t='1'>2</a><a t='1'>3</a></r>");
+  const Node* const second = document->GetDocumentElement()->GetFirstChild()->GetNextSibling();
+  EXPECT_EQ(CanonicalText(document.Get(), kExclusiveC14n, {}, second),
+            "<r><a t=\"1\">1</a><a t=\"1\">3</a></r>");
+}
+
+// An attribute that is added after parsing belongs to one element only.
+TEST(Canonicalizer, SeesWhatWasAddedToOneOfElementsThatAreAlike) {
+  const Ref<Document> document = ParseXmlText("<r><a t='1'>1</a><a t='1'>2</a><a t='1'>3</a></r>");
+  AsElement(document->GetDocumentElement()->GetFirstChild()->GetNextSibling())->DefineAttribute("s", "2");
+  EXPECT_EQ(CanonicalText(document.Get(), kExclusiveC14n),
+            "<r><a t=\"1\">1</a><a s=\"2\" t=\"1\">2</a><a t=\"1\">3</a></r>");
+}
+
 // ---- The exceptions
 
 TEST(XmlSecurityException, KeepsItsClassAndTextInCopies) {

@@ -334,6 +334,44 @@ TEST(ElementNode, TakesNamesBeyondAscii) {
   EXPECT_EQ(WriteXmlText(element.Get()), "<\xC3\xA9:\xE5\xAD\x97 \xC3\xA9\xCC\x81:x=\"v\"/>");
 }
 
+// Elements with the same attributes may share them, which must not show when one of them changes.
+TEST(ElementNode, KeepsItsAttributesWhenOneLikeItGetsAnother) {
+  const char* const kText =
+      "<r><a p='1' xmlns:x='urn:x'/><a p='1' xmlns:x='urn:x'/><a p='1' xmlns:x='urn:x'/></r>";
+  for (int changed = 0; changed < 3; ++changed) {
+    const Ref<Document> document = ParseXmlText(kText);
+    std::vector<ElementNode*> elements;
+    for (Node* child = document->GetDocumentElement()->GetFirstChild(); child != nullptr;
+         child = child->GetNextSibling()) {
+      elements.push_back(AsElement(child));
+    }
+    elements[changed]->DefineAttribute("xmlns:y", "urn:y");
+    elements[changed]->DefineAttribute("y:q", "2");
+    for (int i = 0; i < 3; ++i) {
+      EXPECT_EQ(WriteXmlText(elements[i]), i == changed
+                                               ? "<a p=\"1\" xmlns:x=\"urn:x\" xmlns:y=\"urn:y\" y:q=\"2\"/>"
+                                               : "<a p=\"1\" xmlns:x=\"urn:x\"/>");
+      EXPECT_EQ(*elements[i]->FindNamespaceUri("x"), "urn:x");
+      EXPECT_EQ(elements[i]->FindNamespaceUri("y") != nullptr, i == changed);
+    }
+  }
+}
+
+TEST(ElementNode, KeepsItsAttributesWhenTheDocumentGoes) {
+  Ref<Document> document = ParseXmlText("<r><a p='1'/><a p='1'/></r>");
+  const Ref<ElementNode> last(AsElement(document->GetDocumentElement()->GetLastChildNode()));
+  document = nullptr;
+  EXPECT_EQ(WriteXmlText(last.Get()), "<a p=\"1\"/>");
+}
+
+// Names, values, number and order: all count.
+TEST(ElementNode, HasTheAttributesThatItWasWrittenWith) {
+  const std::string text =
+      "<r><a p=\"1\"/><a p=\"2\"/><a q=\"2\"/><a q=\"2\" p=\"1\"/><a p=\"1\" q=\"2\"/><a/><a p=\"1\" q=\"2\"/>"
+      "<b p=\"1\" q=\"2\"/><b p=\"1\" q=\"2\"><b p=\"1\"/></b><a p=\"1\"/><a p=\"\"/><a xmlns:p=\"urn:1\"/></r>";
+  EXPECT_EQ(WriteXmlText(ParseXmlText(text)->GetDocumentElement()), text);
+}
+
 // ---- Namespaces
 
 TEST(ElementNode, FindsNamespacesOutward) {

@@ -129,7 +129,14 @@ const Node* CanonicalWalk::Enter(const Node* node) {
     WriteLeaf(node);
     return nullptr;
   }
-  StartElement(element);
+  if (IsLikeLastLeaf(element)) {
+    _sink.Put(_startTagOfLastLeaf);
+    _frames.push_back({_inScope.size(), _rendered.size(), element, nullptr});
+  } else {
+    const std::size_t begin = _sink.GetCount();
+    StartElement(element);
+    RememberLeaf(element, _sink.GetSince(begin));
+  }
   if (element->GetFirstChildNode() == nullptr) {
     EndElement(element);
   }
@@ -193,6 +200,35 @@ void CanonicalWalk::EndElement(const ElementNode* element) {
   _inScope.resize(_frames.back().inScope);
   _rendered.resize(_frames.back().rendered);
   _frames.pop_back();
+}
+
+// ---- Leaves
+
+namespace {
+
+bool IsLeaf(const ElementNode* element) noexcept {
+  const Node* const child = element->GetFirstChildNode();
+  return child == nullptr || (child->GetKind() == TEXT_NODE && child->GetNextSibling() == nullptr);
+}
+
+}  // namespace
+
+// The values of a token's attribute come by the thousand, with one name and one list of attributes, which the
+// parser lets them share, amid the same namespaces: so their start tags are the same. To copy them took a
+// third off the canonical form of 5000 groups, and a tenth off their validation (1.95 -> 1.76 times the
+// floor).
+bool CanonicalWalk::IsLikeLastLeaf(const ElementNode* element) const noexcept {
+  return _lastLeaf != nullptr && element->GetParent() == _lastLeaf->GetParent() &&
+         &element->GetQualifiedName() == &_lastLeaf->GetQualifiedName() &&
+         &element->GetAttributes() == &_lastLeaf->GetAttributes() && IsLeaf(element);
+}
+
+void CanonicalWalk::RememberLeaf(const ElementNode* element, std::string_view startTag) {
+  const bool isKnown = !startTag.empty() && IsLeaf(element);
+  _lastLeaf = isKnown ? element : nullptr;
+  if (isKnown) {
+    _startTagOfLastLeaf.assign(startTag);
+  }
 }
 
 // ---- Attributes

@@ -67,6 +67,8 @@ class CanonicalWalk final {
   void WriteTree(const ElementNode* apex);
   const Node* Enter(const Node* node);
   void StartElement(const ElementNode* element);
+  bool IsLikeLastLeaf(const ElementNode* element) const noexcept;
+  void RememberLeaf(const ElementNode* element, std::string_view startTag);
   void EndElement(const ElementNode* element);
   bool IsWritten(const Node* node) const noexcept;
   void WriteLeaf(const Node* node);
@@ -97,6 +99,9 @@ class CanonicalWalk final {
   std::vector<Binding> _inScope;
   std::vector<Binding> _rendered;
   std::vector<Frame> _frames;
+  // An element without child elements, the last one if its start tag is known; else null.
+  const ElementNode* _lastLeaf = nullptr;
+  std::string _startTagOfLastLeaf;
   std::vector<PlainAttribute> _attributes;  // Those of the element being started.
 };
 

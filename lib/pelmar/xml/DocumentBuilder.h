@@ -29,9 +29,11 @@ class DocumentBuilder final : public XMLHandler {
 
  private:
   void Append(Node* node);
+  void TakeAttributes(ElementNode* element, const AttributeRange* attributes, std::size_t count);
 
   Ref<Document> _document;
-  ParentNode* _current;  // The innermost open element, or the document.
+  ElementNode* _lastWithAttributes = nullptr;  // In the document.
+  ParentNode* _current;                        // The innermost open element, or the document.
 };
 
 }  // namespace Xml

@@ -154,9 +154,11 @@ ElementNode::ElementNode(Ref<const ElementName> name)
 
 ElementNode::~ElementNode() = default;
 
+const AttributeList ElementNode::kNoAttributes;
+
 std::set<std::string> ElementNode::GetAttributeNames() const {
   std::set<std::string> names;
-  for (const Attribute& attribute : _attributes) {
+  for (const Attribute& attribute : GetAttributes()) {
     names.insert(attribute.name);
   }
   return names;
@@ -176,7 +178,7 @@ const std::string* FindValue(const AttributeList& attributes, const std::string&
 }  // namespace
 
 bool ElementNode::GetAttribute(const std::string& name, std::string& value) const {
-  const std::string* const found = FindValue(_attributes, name);
+  const std::string* const found = FindValue(GetAttributes(), name);
   if (found != nullptr) {
     value = *found;
   }
@@ -188,7 +190,7 @@ bool ElementNode::GetAttribute(const QName& name, std::string& value) const {
     return name.GetLocalName().find(':') == std::string::npos && name.GetLocalName() != "xmlns" &&
            GetAttribute(name.GetLocalName(), value);
   }
-  for (const Attribute& attribute : _attributes) {
+  for (const Attribute& attribute : GetAttributes()) {
     const NameParts parts = SplitName(attribute.name);
     if (parts.prefix.empty() || parts.localName != name.GetLocalName()) {
       continue;
@@ -265,16 +267,26 @@ void RequireAttribute(const std::string& name, const std::string& value) {
 
 void ElementNode::DefineAttribute(const std::string& name, const std::string& value) {
   RequireAttribute(name, value);
-  const std::string* const present = FindValue(_attributes, name);
+  const std::string* const present = FindValue(GetAttributes(), name);
   if (present == nullptr) {
     std::string_view prefix;
-    _attributes.push_back(Attribute{name, value});
+    GetOwnAttributes().push_back(Attribute{name, value});
     _declaresNamespaces = _declaresNamespaces || IsNamespaceDeclaration(name, prefix);
     return;
   }
   if (*present != value) {
     throw InvalidArgumentException("attribute '" + name + "' is already defined with another value");
   }
+}
+
+// A shared list stays with the others.
+AttributeList& ElementNode::GetOwnAttributes() {
+  if (!_attributes || _attributes->_isShared) {
+    const Ref<AttributeHolder> own(new AttributeHolder());
+    own->_list = GetAttributes();
+    _attributes = own;
+  }
+  return _attributes->_list;
 }
 
 ElementNode* ElementNode::FindChildElement(const std::string& localName) const noexcept {

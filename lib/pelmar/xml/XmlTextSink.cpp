@@ -80,6 +80,7 @@ void XmlTextSink::PutBeyondBuffer(std::string_view bytes) {
   Flush();
   if (bytes.size() > _buffer.size()) {
     _writer->Write(bytes.data(), bytes.size());
+    _flushed += bytes.size();
     return;
   }
   Put(bytes);
@@ -138,6 +139,7 @@ void XmlTextSink::Flush() {
   if (_used > 0) {
     _writer->Write(_buffer.data(), _used);
     _mostUsed = std::max(_mostUsed, _used);
+    _flushed += _used;
     _used = 0;
   }
 }

@@ -59,12 +59,22 @@ class XmlTextSink final {
 
   void Flush();
 
+  /// How many bytes were put so far.
+  std::size_t GetCount() const noexcept { return _flushed + _used; }
+  /// What was put since there were `count` bytes; empty when a part of it has left the buffer. Valid until
+  /// more is put.
+  std::string_view GetSince(std::size_t count) const noexcept {
+    return count < _flushed ? std::string_view()
+                            : std::string_view(_buffer.data() + (count - _flushed), GetCount() - count);
+  }
+
  private:
   void PutBeyondBuffer(std::string_view bytes);
   template <typename Escapes>
   void PutEscaped(std::string_view text, const Escapes& escapes);
 
   Writer* _writer;
+  std::size_t _flushed = 0;
   std::size_t _used = 0;
   std::size_t _mostUsed = 0;
   std::array<char, 4096> _buffer;

@@ -123,6 +123,23 @@ struct Attribute {
 /// In the order in which they were read or defined.
 typedef std::vector<Attribute, NodeAllocator<Attribute>> AttributeList;
 
+/// Where the attributes of an element lie. The elements of a parsed document that follow each other with the
+/// same ones share them, until one is given another.
+class AttributeHolder final : public Object {
+ public:
+  static void* operator new(std::size_t size) { return AllocateNodeMemory(size); }
+  static void operator delete(void* memory, std::size_t size) noexcept { FreeNodeMemory(memory, size); }
+
+ private:
+  friend class ElementNode;
+  friend class DocumentBuilder;
+  AttributeHolder() noexcept : _isShared(false) {}
+  ~AttributeHolder() override {}
+
+  AttributeList _list;
+  bool _isShared;  // Then the list does not change any more.
+};
+
 /// An element: a name as written, an ordered list of attributes, and children.
 class PELMAR_API ElementNode final : public ParentNode {
  public:
@@ -138,7 +155,9 @@ class PELMAR_API ElementNode final : public ParentNode {
   unsigned long GetLine() const noexcept { return _line; }
   unsigned long GetColumn() const noexcept { return _column; }
 
-  const AttributeList& GetAttributes() const noexcept { return _attributes; }
+  const AttributeList& GetAttributes() const noexcept {
+    return _attributes ? _attributes->_list : kNoAttributes;
+  }
   /// The names as written, declarations included, sorted bytewise.
   std::set<std::string> GetAttributeNames() const;
 
@@ -180,13 +199,17 @@ class PELMAR_API ElementNode final : public ParentNode {
   explicit ElementNode(Ref<const ElementName> name);
   ~ElementNode() override;
 
+  AttributeList& GetOwnAttributes();
+
+  static const AttributeList kNoAttributes;
+
   // No text that is parsed has more lines, or columns, than these can count.
   std::uint32_t _line;
   std::uint32_t _column;
   bool _writtenWithEndTag;
   bool _declaresNamespaces;
   Ref<const ElementName> _name;
-  AttributeList _attributes;
+  Ref<AttributeHolder> _attributes;  // Null when there are none.
 };
 
 /// Character data. Adjacent runs of characters, references and CDATA sections are one text node after
