@@ -3,6 +3,8 @@
 
 #include "quorlin/dates.h"
 
+#include <array>
+#include <charconv>
 #include <cstddef>
 #include <cstdint>
 #include <limits>
@@ -17,9 +19,12 @@ namespace {
 constexpr std::uint32_t kMicrosecondsPerMinute = 60000000;
 constexpr long long kMicrosecondsPerSecond = 1000000;
 
+// For numbers that are not negative.
 void AppendPadded(std::string& text, int number, std::size_t width) {
-  const std::string digits = std::to_string(number);
-  text.append(digits.size() < width ? width - digits.size() : 0, '0').append(digits);
+  std::array<char, std::numeric_limits<int>::digits10 + 2> digits;
+  const std::to_chars_result end = std::to_chars(digits.data(), digits.data() + digits.size(), number);
+  const std::size_t count = static_cast<std::size_t>(end.ptr - digits.data());
+  text.append(count < width ? width - count : 0, '0').append(digits.data(), count);
 }
 
 long long SaturatingAdd(long long a, long long b) {
@@ -51,6 +56,7 @@ long long SaturatingSecondsToMicroseconds(long long seconds) {
 std::string DateTimeFormatter(DateTime date) {
   const DateTimeFields fields = date.GetFields();
   std::string text;
+  text.reserve(sizeof("2026-01-01T00:00:00.000Z"));
   AppendPadded(text, fields.century * 100 + fields.yearOfCentury, 4);
   text += '-';
   AppendPadded(text, fields.month, 2);

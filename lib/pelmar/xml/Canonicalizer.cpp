@@ -9,6 +9,9 @@
 #include <pelmar/xml/security/Algorithms.h>
 #include <pelmar/xml/security/Exceptions.h>
 
+#include <string_view>
+#include <utility>
+
 namespace Pelmar {
 namespace Xml {
 namespace Security {
@@ -19,7 +22,7 @@ namespace {
 
 class CanonicalizerImpl final : public Canonicalizer {
  public:
-  explicit CanonicalizerImpl(const CanonicalForm& form) : _form(form) {}
+  explicit CanonicalizerImpl(CanonicalForm form) : _form(std::move(form)) {}
 
   void Canonicalize(const Node* node, Writer* writer, const Node* omitted) const override {
     if (node == nullptr) {
@@ -36,12 +39,15 @@ class CanonicalizerImpl final : public Canonicalizer {
 };
 
 // Inclusive canonical XML is written with and without the final "#".
+bool IsInclusive(std::string_view algorithm) noexcept {
+  constexpr std::string_view kInclusive = kC14n;
+  return algorithm == kInclusive || algorithm == kInclusive.substr(0, kInclusive.size() - 1);
+}
+
 bool FindForm(const std::string& algorithm, CanonicalForm& form) {
-  const std::string inclusive(kC14n);
-  const bool isInclusive = algorithm == inclusive || algorithm + "#" == inclusive;
   form.exclusive = algorithm == kExclusiveC14n || algorithm == kExclusiveC14nWithComments;
   form.withComments = algorithm == kC14nWithComments || algorithm == kExclusiveC14nWithComments;
-  return isInclusive || form.exclusive || form.withComments;
+  return form.exclusive || form.withComments || IsInclusive(algorithm);
 }
 
 }  // namespace
@@ -62,7 +68,7 @@ Ref<Canonicalizer> CreateCanonicalizer(const std::string& algorithm,
   for (const std::string& prefix : inclusivePrefixes) {
     form.inclusivePrefixes.push_back(prefix == "#default" ? std::string() : prefix);
   }
-  return MakeRef<CanonicalizerImpl>(form);
+  return MakeRef<CanonicalizerImpl>(std::move(form));
 }
 
 }  // namespace Security

@@ -12,6 +12,7 @@
 #include <pelmar/SecretText.h>
 #include <pelmar/StringUtil.h>
 
+#include <algorithm>
 #include <utility>
 
 namespace Pelmar {
@@ -283,6 +284,9 @@ void ElementNode::DefineAttribute(const std::string& name, const std::string& va
 AttributeList& ElementNode::GetOwnAttributes() {
   if (!_attributes || _attributes->_isShared) {
     const Ref<AttributeHolder> own(new AttributeHolder());
+    // So that the usual few do not move from one place to the next as they come.
+    constexpr std::size_t kUsualAttributes = 4;
+    own->_list.reserve(std::max(kUsualAttributes, GetAttributes().size() + 1));
     own->_list = GetAttributes();
     _attributes = own;
   }
