@@ -219,7 +219,7 @@ TEST(Signature, IsNotConfusedByOtherAttributesOfTheSameValue) {
   plan.uri = "#urn:x";
   const std::string text = SignDocument(Replace(kPlain, "\"_1\"", "\"urn:x\""), Signer(), plan);
   const Ref<Document> document = ParseDocument(
-      "<e:Envelope xmlns:e=\"urn:e\" xmlns:id=\"urn:x\"><x InResponseTo=\"urn:x\" d=\"urn:x\" grid="
+      "<e:Envelope xmlns:e=\"urn:e\" xmlns:id=\"urn:x\"><x InResponseTo=\"urn:x\" d=\"urn:x\" ad=\"urn:x\" is=\"urn:x\" grid="
       "\"urn:x\"/>" +
       text + "</e:Envelope>");
   EXPECT_EQ(VerifyElement(document->GetDocumentElement()->FindChildElement("Assertion"), Trust({Signer()})),
@@ -276,8 +276,15 @@ TEST(Signature, TakesOnlyIdsThatCount) {
       "XmlSecurityException: Reference '#plain' refers to no element that could be signed";
   EXPECT_EQ(RefusalOf([] { SignMessage({"#plain"}, {}); }), expected);
   // Beside another ID that counts, either.
-  EXPECT_EQ(RefusalOf([] { SignDocument("<a ID=\"_2\" Id=\"_1\"/>", Signer()); }),
-            "XmlSecurityException: Reference '#_1' refers to no element that could be signed");
+  const std::string refusal =
+      "XmlSecurityException: Reference '#_1' refers to no element that could be signed";
+  EXPECT_EQ(RefusalOf([] { SignDocument("<a ID=\"_2\" Id=\"_1\"/>", Signer()); }), refusal);
+  // WS-Security's is for parts of a message, not for what is signed as a whole.
+  const std::string start =
+      "<a xmlns:u=\"http://docs.oasis-open.org/wss/2004/01/oasis-200401-wss-wssecurity-utility-1.0.xsd\"";
+  for (const std::string rest : {" u:Id=\"_1\"/>", "><b Id=\"_1\" u:Id=\"_2\"/></a>"}) {
+    EXPECT_EQ(RefusalOf([&] { SignDocument(start + rest, Signer()); }), refusal) << rest;
+  }
 }
 
 TEST(Signature, DoesNotFindElementsOutsideItsContext) {

@@ -75,6 +75,10 @@ TEST(PrincipalId, DiffersInAnythingButCase) {
 TEST(PrincipalIdDeathTest, MustNotHaveAnEmptyPart) {
   EXPECT_DEATH(PrincipalId("", "domain"), "!name\\.empty\\(\\)");
   EXPECT_DEATH(PrincipalId("name", ""), "!domain\\.empty\\(\\)");
+  const std::string part = "part";
+  const std::string none;
+  EXPECT_DEATH(PrincipalId(none, part), "!name\\.empty\\(\\)");
+  EXPECT_DEATH(PrincipalId(part, none), "!domain\\.empty\\(\\)");
 }
 
 TEST(SamlToken, NumbersItsConfirmationTypes) {
