@@ -20,7 +20,7 @@
 
 namespace {
 
-constexpr std::size_t kMaxMutants = 8192;
+constexpr std::size_t kMaxMutants = 16384;
 
 using Hits = std::atomic<bool>[kMaxMutants];
 

@@ -12,7 +12,7 @@ The sources are read as text, in the shape that clang-format gives them; what is
   zero, one        a function of int returns that
 
 Not mutated: what only happens when OpenSSL or curl has no memory. Of the condition that finds it out, which often makes the
-call, `never` and `skip` are tried: then the call is not made.
+call, `never` and `skip` are tried where there is one: then the call is not made.
 """
 
 import re
@@ -22,7 +22,7 @@ PROLOGUE = "extern \"C\" bool QuorlinIsMutant(int number) noexcept;\n"
 
 KEYWORDS = {"return", "throw", "if", "for", "while", "do", "switch", "case", "break", "continue", "else", "try", "catch",
             "using", "typedef", "static", "const", "constexpr", "goto", "struct", "class", "enum", "namespace", "template",
-            "default", "public", "private", "protected", "extern", "inline", "friend", "delete", "auto", "static_assert"}
+            "default", "thread_local", "public", "private", "protected", "extern", "inline", "friend", "delete", "auto", "static_assert"}
 TYPES = {"unsigned", "long", "int", "char", "bool", "double"}
 DECLARATION = re.compile(r"^[\w:]+(<[^;]*?>)?(::\w+)?[\s*&]+(const\s+)?\w+\s*[=;({\[]")
 CODE_BRACE = re.compile(r"(\)|\bconst|\bnoexcept|\boverride|\bfinal|\belse|\btry|\bdo|\bmutable|\]|->\s*[\w:<>&* ]+)$")
@@ -135,8 +135,8 @@ class Writer:
                     return match
         return None
 
-    def condition(self, begin, end, always=True):
-        """The mutants of a boolean expression."""
+    def condition(self, begin, end, calls_only=False):
+        """The mutants of a boolean expression, or only those by which a call in it is not made."""
         begin, end = self.trim(begin, end)
         text = self.source[begin:end]
         if not text or "?" in self.text[begin:end] and self.find_top(begin, end, r"\?"):
@@ -144,22 +144,25 @@ class Writer:
         start = "("
         if text != "false":
             start += f"QuorlinIsMutant({self.add(begin, 'never', text)}) ? false : "
-        if text != "true" and always:
+        if text != "true" and not calls_only:
             start += f"QuorlinIsMutant({self.add(begin, 'always', text)}) ? true : "
         self.around(begin, end, start + "static_cast<bool>(", "))")
-        self.operands(begin, end)
+        self.operands(begin, end, calls_only)
 
-    def operands(self, begin, end):
+    def operands(self, begin, end, calls_only=False):
         for operators, neutral in ((("||",), "false"), (("&&",), "true")):
             spans = self.split(begin, end, operators)
             if len(spans) > 1:
                 for span in spans:
                     low, high = self.trim(*span)
+                    if calls_only and "(" not in self.text[low:high]:
+                        continue
                     number = self.add(low, "skip", self.source[low:high])
                     self.around(low, high, f"(QuorlinIsMutant({number}) ? {neutral} : static_cast<bool>(", "))")
-                    self.operands(low, high)
+                    self.operands(low, high, calls_only)
                 return
-        self.boundary(begin, end)
+        if not calls_only:
+            self.boundary(begin, end)
 
     def boundary(self, begin, end):
         match = self.find_top(begin, end, r" (<=|>=|<|>) ")
@@ -209,9 +212,10 @@ class Writer:
             self.head(i + 1, end)
         elif re.search(r"\bwhile$", before):
             low, high = self.trim(i + 1, end)
-            number = self.add(low, "loop", self.source[low:high])
-            self.around(low, high, f"(QuorlinIsMutant({number}) ? false : static_cast<bool>(", "))")
-            self.operands(low, high)
+            if not self.find_top(low, high, r" = "):  # A declaration, which nothing can stand around.
+                number = self.add(low, "loop", self.source[low:high])
+                self.around(low, high, f"(QuorlinIsMutant({number}) ? false : static_cast<bool>(", "))")
+                self.operands(low, high)
         self.inner(i + 1, end)
         return end + 1
 
@@ -223,7 +227,7 @@ class Writer:
         if not body or not BREAKDOWN.match(self.source, end + 1 + body.end()):
             self.condition(begin, end)
         elif "(" in text:
-            self.condition(begin, end, always=False)
+            self.condition(begin, end, calls_only=True)
 
     def inner(self, begin, end):
         """Lambdas within an expression have statements of their own."""
