@@ -39,18 +39,20 @@ TEST(CookieStore, ReplacesInPlace) {
 TEST(CookieStore, TakesNameDomainAndPathForTheCookie) {
   const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
   const Lines all = {MakeLine("a", "1"), MakeLine("a", "2", "/x"), MakeLine("a", "3", "/", "other"),
-                     MakeLine("A", "4")};
+                     MakeLine("A", "4"), MakeLine("a", "5", "/", "most")};
   store->Merge({}, all);
   EXPECT_EQ(all, store->GetLines());
 }
 
 TEST(CookieStore, SeesTheSameDomainBehindMarks) {
-  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
-  const Lines before = {MakeLine("a", "1")};
-  store->Merge({}, before);
-  const Lines after = {MakeLine("a", "2", "/", "#HttpOnly_.host")};
-  store->Merge(before, after);
-  EXPECT_EQ(after, store->GetLines());
+  for (const std::string domain : {"#HttpOnly_host", ".host", "#HttpOnly_.host"}) {
+    const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+    const Lines before = {MakeLine("a", "1"), MakeLine("b", "1")};
+    store->Merge({}, before);
+    const std::string changed = MakeLine("a", "2", "/", domain);
+    store->Merge(before, {before[1], changed});
+    EXPECT_EQ((Lines{changed, before[1]}), store->GetLines()) << domain;
+  }
 }
 
 TEST(CookieStore, RemovesWhatTheExchangeRemoved) {
@@ -66,6 +68,17 @@ TEST(CookieStore, KeepsWhatAnotherExchangeBroughtMeanwhile) {
   store->Merge({}, {MakeLine("a", "1")});
   store->Merge({}, {MakeLine("b", "2")});
   EXPECT_EQ((Lines{MakeLine("a", "1"), MakeLine("b", "2")}), store->GetLines());
+}
+
+TEST(CookieStore, KeepsWhatAnotherExchangeChangedMeanwhile) {
+  const Ref<CookieStoreImpl> store = MakeRef<CookieStoreImpl>();
+  const Lines before = {MakeLine("a", "1")};
+  store->Merge({}, before);
+  const Lines changed = {MakeLine("a", "2")};
+  store->Merge(before, changed);
+  // Began before that, and was given no cookie.
+  store->Merge(before, before);
+  EXPECT_EQ(changed, store->GetLines());
 }
 
 TEST(CookieStore, ForgetsTheOldestBeyondTheBound) {
