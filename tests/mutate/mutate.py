@@ -49,7 +49,7 @@ SOURCES = """
 lib/quorlin/TokenValidation.cpp lib/quorlin/SamlTokenImpl.cpp lib/quorlin/AssertionParser.cpp lib/quorlin/xmlReading.cpp
 lib/quorlin/ResponseHandlerImpl.cpp lib/quorlin/HttpsClient.cpp lib/quorlin/RequestBuilderImpl.cpp
 lib/quorlin/GssNegotiationContextImpl.cpp
-lib/quorlin-provider/TokenKeeper.cpp lib/quorlin-provider/TokenCache.cpp lib/quorlin-provider/Timing.cpp
+lib/quorlin-provider/TokenCache.cpp lib/quorlin-provider/Timing.cpp
 lib/pelmar/xml/SignatureVerifier.cpp lib/pelmar/xml/SignatureReferenceTarget.cpp lib/pelmar/xml/SignatureReferenceDigest.cpp
 lib/pelmar/xml/SignatureReferenceImpl.cpp lib/pelmar/xml/SignatureProfile.cpp lib/pelmar/xml/SignatureSyntax.cpp
 lib/pelmar/xml/SignatureChildren.cpp lib/pelmar/xml/SignatureMaker.cpp lib/pelmar/xml/KeyInfoCertificates.cpp
