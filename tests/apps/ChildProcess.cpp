@@ -41,6 +41,13 @@ void SendToSelf(int number) {
   kill(getpid(), number);
 }
 
+// Whoever runs the tests in the background may have them ignored.
+void TakeSignalsAsUsual() {
+  for (const int number : {SIGHUP, SIGINT, SIGQUIT, SIGTERM}) {
+    signal(number, SIG_DFL);
+  }
+}
+
 pid_t ForkDetached(int& channel) {
   std::array<int, 2> pipeEnds;
   if (pipe2(pipeEnds.data(), O_CLOEXEC) != 0) {
@@ -70,6 +77,7 @@ ChildProcess::ChildProcess(const std::vector<std::string>& arguments, Terminal t
     ThrowErrno("cannot start a process");
   }
   if (_process == 0) {
+    TakeSignalsAsUsual();
     if (pendingSignal != 0) {
       SendToSelf(pendingSignal);
     }
