@@ -57,7 +57,7 @@ lib/pelmar/xml/TrustChainKeyResolver.cpp lib/pelmar/xml/NamespaceChecker.cpp lib
 lib/pelmar/xml/CanonicalWalk.cpp lib/pelmar/xml/Canonicalizer.cpp lib/pelmar/xml/Parser.cpp
 lib/pelmar/crypto/CertificateChain.cpp lib/pelmar/crypto/SignatureValue.cpp lib/pelmar/crypto/KeyStrength.cpp
 lib/pelmar/crypto/VerifiedChainCache.cpp lib/pelmar/crypto/EcdsaValue.cpp lib/pelmar/crypto/X509Fields.cpp
-lib/pelmar/crypto/CertificateImpl.cpp lib/pelmar/crypto/CertificateCache.cpp lib/pelmar/crypto/VerificationContexts.cpp
+lib/pelmar/crypto/CertificateImpl.cpp lib/pelmar/crypto/CertificateCache.cpp lib/pelmar/crypto/KeyContexts.cpp
 lib/pelmar/crypto/CertificatePem.cpp lib/pelmar/crypto/PrivateKeyImpl.cpp lib/pelmar/crypto/PrivateKeyInput.cpp
 lib/pelmar/crypto/FunctionKey.cpp lib/pelmar/crypto/Pkcs12.cpp lib/pelmar/crypto/Pkcs12Profile.cpp
 lib/pelmar/crypto/DigestWriter.cpp

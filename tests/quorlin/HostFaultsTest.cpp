@@ -75,16 +75,14 @@ class DescriptorLimit final {
   rlimit _before;
 };
 
-#if defined(__SANITIZE_THREAD__)
-/// The processes of these tests end, on purpose, with the server's threads at work. The thread sanitizer
-/// reads what to make of that when a process starts.
-void AllowEndingsWithThreads() {
-  const char* const options = std::getenv("TSAN_OPTIONS");
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+/// The processes of these tests end, on purpose, with threads at work, or as the forked children of such
+/// ones. The sanitizers read what to make of that when a process starts.
+void AllowEndingsWithThreads(const char* variable, const char* option) {
+  const char* const options = std::getenv(variable);
   const std::string before = options == nullptr ? "" : std::string(options) + ":";
-  setenv("TSAN_OPTIONS", (before + "report_thread_leaks=0").c_str(), 1);
+  setenv(variable, (before + option).c_str(), 1);
 }
-#else
-void AllowEndingsWithThreads() {}
 #endif
 
 /// Each in a process of its own.
@@ -92,7 +90,11 @@ class HostFaultsDeathTest : public testing::Test {
  public:
   HostFaultsDeathTest() {
     testing::FLAGS_gtest_death_test_style = "threadsafe";
-    AllowEndingsWithThreads();
+#if defined(__SANITIZE_THREAD__)
+    AllowEndingsWithThreads("TSAN_OPTIONS", "report_thread_leaks=0");
+#elif defined(__SANITIZE_ADDRESS__)
+    AllowEndingsWithThreads("ASAN_OPTIONS", "detect_leaks=0");
+#endif
   }
 };
 
@@ -100,6 +102,7 @@ class HostFaultsDeathTest : public testing::Test {
   std::exit(testing::Test::HasFailure() ? 1 : 0);
 }
 
+#if !defined(__SANITIZE_ADDRESS__)  // The check of virtual calls that comes with it needs a pipe for each.
 TEST_F(HostFaultsDeathTest, WithoutDescriptorsTheClientDoesNotStartAndThenItDoes) {
   EXPECT_EXIT(
       {
@@ -133,6 +136,7 @@ TEST_F(HostFaultsDeathTest, WithoutDescriptorsARequestFailsAndTheNextWorks) {
       },
       testing::ExitedWithCode(0), "");
 }
+#endif
 
 // --- Fork ---
 
