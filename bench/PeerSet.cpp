@@ -20,6 +20,7 @@ namespace {
 
 /// A just-in-time compiler comes to rest when so many batches for each token have made nothing faster.
 constexpr double kBatchMicroseconds = 100000;
+constexpr double kLeastMicroseconds = 10;  // No peer is that quick.
 constexpr std::size_t kRestfulBatches = 12;
 constexpr std::size_t kMaxBatches = 150;
 constexpr double kImprovement = 0.97;
@@ -99,7 +100,10 @@ double RunBatches(PeerProcess& peer, bool checksChain, std::vector<std::size_t>&
   for (std::size_t i = 0; i < GetSamples().size(); ++i) {
     if (CanValidate(GetSamples()[i], checksChain)) {
       const double each = peer.Time(i, calls[i]);
-      calls[i] = static_cast<std::size_t>(std::max(1.0, kBatchMicroseconds / std::max(each, 1.0)));
+      // On some machines another process's clock stands still now and then: a batch must not become minutes.
+      if (each >= kLeastMicroseconds) {
+        calls[i] = static_cast<std::size_t>(std::max(1.0, kBatchMicroseconds / each));
+      }
       // In proportion: the longest token must not hide the others.
       sum += each / static_cast<double>(GetSamples()[i].token.text.size());
     }
