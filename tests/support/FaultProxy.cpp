@@ -3,6 +3,8 @@
 
 #include "support/FaultProxy.h"
 
+#include "support/LoopbackSocket.h"
+
 #include <linux/sockios.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
@@ -13,36 +15,14 @@
 #include <unistd.h>
 
 #include <cstdint>
-#include <stdexcept>
 
 namespace TestSupport {
 
 namespace {
 
-void Require(bool condition, const char* what) {
-  if (!condition) {
-    throw std::runtime_error(what);
-  }
-}
-
-sockaddr_in MakeAddress(int port) {
-  sockaddr_in address = {};
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  address.sin_port = htons(static_cast<std::uint16_t>(port));
-  return address;
-}
-
 int Listen(int& port) {
-  const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  Require(socket >= 0, "no socket");
-  sockaddr_in address = MakeAddress(0);
-  socklen_t size = sizeof address;
-  Require(::bind(socket, reinterpret_cast<const sockaddr*>(&address), size) == 0 &&
-              ::listen(socket, 1) == 0 &&
-              ::getsockname(socket, reinterpret_cast<sockaddr*>(&address), &size) == 0,
-          "cannot listen");
-  port = ntohs(address.sin_port);
+  const int socket = BindSocket(port);
+  Require(::listen(socket, 1) == 0, "cannot listen");
   return socket;
 }
 

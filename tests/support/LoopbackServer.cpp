@@ -3,6 +3,8 @@
 
 #include "support/LoopbackServer.h"
 
+#include "support/LoopbackSocket.h"
+
 #include <arpa/inet.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
@@ -33,32 +35,6 @@ struct Broken {};
 
 constexpr int kBacklog = 512;
 constexpr std::size_t kReadSize = 16384;
-
-void Require(bool condition, const char* what) {
-  if (!condition) {
-    throw std::runtime_error(what);
-  }
-}
-
-sockaddr_in MakeAddress(int port) {
-  sockaddr_in address = {};
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  address.sin_port = htons(static_cast<std::uint16_t>(port));
-  return address;
-}
-
-/// A socket on a free port; the port goes to `port`.
-int BindSocket(int& port) {
-  const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  Require(socket >= 0, "no socket");
-  sockaddr_in address = MakeAddress(0);
-  socklen_t size = sizeof address;
-  Require(::bind(socket, reinterpret_cast<const sockaddr*>(&address), size) == 0, "cannot bind");
-  Require(::getsockname(socket, reinterpret_cast<sockaddr*>(&address), &size) == 0, "no socket name");
-  port = ntohs(address.sin_port);
-  return socket;
-}
 
 // OpenSSL writes without MSG_NOSIGNAL.
 void BlockSigpipe() {
